@@ -1,0 +1,54 @@
+// The value of a many-valued property: a collection owned by one element's property.
+//
+// Every change runs inside an `Operation` (a transaction of the owner's model, joined
+// when one is open) and records the owner's old contents first, so collections take
+// part in change reports and rollback like single values.
+#pragma once
+
+#include "qf/zero/core/element_impl.h"
+#include "qf/zero/core/generic_collection.h"
+#include "qf/zero/core/meta/property.h"
+#include "qf/zero/core/transaction.h"
+#include "qf/zero/core/value.h"
+
+#include <vector>
+
+namespace qf::zero {
+
+class AbstractOwnedCollection : public GenericCollectionInterface {
+ public:
+  AbstractOwnedCollection(ModelElement::Impl* owner, meta::Property property)
+      : owner_(owner), property_(std::move(property)) {}
+  ~AbstractOwnedCollection() override = default;
+  AbstractOwnedCollection(const AbstractOwnedCollection&) = delete;
+  AbstractOwnedCollection& operator=(const AbstractOwnedCollection&) = delete;
+
+  ModelElement::Impl* getOwner() const noexcept { return owner_; }
+  const meta::Property& getCollectionProperty() const noexcept { return property_; }
+  // Records the owner's old contents; call before the first raw change of an operation.
+  void modifying();
+
+  // The guard around every change: checks the owner may change and opens a
+  // transaction; commit() at the end, or the changes roll back.
+  class Operation {
+   public:
+    explicit Operation(AbstractOwnedCollection& collection);
+    void commit();
+
+   private:
+    Transaction transaction_;
+  };
+
+  // Raw snapshot and restore, used by change tracking. restore keeps the incoming
+  // index of reference targets; it neither checks nor records.
+  virtual std::vector<Value> snapshot() const = 0;
+  virtual void restore(const std::vector<Value>& items) = 0;
+  // Equal to a snapshot: in order for sequences, as multisets otherwise.
+  virtual bool sameContents(const std::vector<Value>& items) const = 0;
+
+ protected:
+  ModelElement::Impl* owner_;
+  meta::Property property_;
+};
+
+}  // namespace qf::zero

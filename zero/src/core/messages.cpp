@@ -1,0 +1,46 @@
+#include "qf/zero/core/messages.h"
+
+namespace qf0::messages {
+
+namespace {
+
+using foundation::core::except::Catalog;
+using foundation::core::except::CatalogEntry;
+
+constexpr CatalogEntry entries[] = {
+    {"CannotAddIncompatibleTypes", "Cannot add a value of type '{2}' where type '{1}' is expected."},
+    {"CannotAddNonExistentObject", "Cannot add an object that does not exist."},
+    {"CannotAddSecondObject", "Cannot add a second object to a single-valued property."},
+    {"CannotCastIncompatibleTypes", "Cannot cast the value to the incompatible type '{1}'."},
+    {"CannotCreateCrossModelAssociation", "Cannot associate elements that belong to different models."},
+    {"CannotCreateWithoutModel", "Cannot create an element without a model."},
+    {"CannotModifyProxy", "Cannot modify a proxy; resolve it to its element first."},
+    {"CannotSetReadOnlyProperty", "Cannot set the read-only property '{1}'."},
+    {"InvalidValue", "The value is not valid here."},
+    {"NoSuchProperty", "The type '{1}' has no property '{2}'."},
+    {"NoSuchType", "The type '{1}' is not registered."},
+    {"UniquenessConstraint", "The value is already present in a property whose values must be unique."},
+    {"CannotCreateCircularContainment", "Cannot contain an element within itself or one of its descendants."},
+    {"CannotModifyDestroyedElement", "Cannot modify an element that has been destroyed."},
+    {"CannotModifyFrozenModel", "Cannot modify a frozen model."},
+    {"CannotSetSetOnceProperty", "The property '{1}' can be set only once and already has a value."},
+    {"CannotInstantiateAbstractClass", "Cannot instantiate the abstract class '{1}'."},
+    {"DuplicateElementId", "An element with the id {1} already exists in the model."},
+    {"NoSuchClass", "The class '{1}' is not registered."},
+    {"NoSuchOperation", "The type '{1}' has no operation '{2}'."},
+    {"WrongArgumentCount", "The operation '{1}' takes {2} arguments but was given {3}."},
+    {"IndexOutOfRange", "The index {1} is out of range for size {2}."},
+    {"TransactionNotOpen", "No transaction is open."},
+    {"TransactionAborted", "The transaction was aborted and cannot be committed."},
+    {"CannotResolveProxy", "Cannot resolve the proxy for element {1}."},
+    {"TypeAlreadyRegistered", "The type '{1}' is already registered."},
+    {"ModelDestroyed", "The model has been destroyed."},
+};
+
+constexpr Catalog messagesCatalog{"qf0:messages", entries};
+
+}  // namespace
+
+const Catalog& catalog() { return messagesCatalog; }
+
+}  // namespace qf0::messages
