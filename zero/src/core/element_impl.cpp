@@ -91,6 +91,11 @@ void ModelElement::Impl::checkAssignable(const meta::Property& property, const V
       if (target.isProxy()) reportException(qf0::messages::InvalidValue());
       checkCircularContainment(target);
     }
+    // Through a container-side reference the target becomes this element's container.
+    if (const meta::Property opposite = property->getOpposite(); opposite && opposite->isContainment()) {
+      if (target.isProxy()) reportException(qf0::messages::InvalidValue());
+      target->checkCircularContainment(ModelElement(const_cast<Impl*>(this)));
+    }
     return;
   }
   if (value.isElement()) {
@@ -346,6 +351,7 @@ void ModelElement::Impl::notifyModifying(int index) {
   if (model_ == nullptr || model_->txn_ == nullptr) reportException(qf0::messages::TransactionNotOpen());
   checkModifiable();
   internal::TransactionState& state = *model_->txn_;
+  ++state.changeCount;
   internal::ElementRecord& record = model_->recordFor(this);
   const int level = state.currentLevel();
   if (record.createdLevel == level) return;
@@ -411,6 +417,7 @@ void ModelElement::Impl::registerIn(ModelImpl* model, const Uuid& id) {
   serial_ = model->nextSerial_++;
   state_ = State::Live;
   model->registerElement(this);
+  ++model->txn_->changeCount;
   internal::ElementRecord& record = model->recordFor(this);
   record.createdLevel = model->txn_->currentLevel();
   model->txn_->list(record);

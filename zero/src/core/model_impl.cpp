@@ -159,7 +159,7 @@ Transaction ModelImpl::beginTransaction(bool savepoint) {
     return Transaction(this, 0);
   }
   ++txn_->openCount;
-  if (!savepoint) return Transaction(this, -1);
+  if (!savepoint) return Transaction(this, -1, txn_->changeCount);
   txn_->levels.emplace_back();
   return Transaction(this, txn_->currentLevel());
 }

@@ -7,16 +7,21 @@
 
 namespace qf::zero {
 
-Transaction::Transaction(ModelImpl* model, int level) noexcept : model_(model), level_(level), open_(true) {}
+Transaction::Transaction(ModelImpl* model, int level, std::uint64_t changeMark) noexcept
+    : model_(model), level_(level), changeMark_(changeMark), open_(true) {}
 
 Transaction::Transaction(Transaction&& other) noexcept
-    : model_(std::move(other.model_)), level_(other.level_), open_(std::exchange(other.open_, false)) {}
+    : model_(std::move(other.model_)),
+      level_(other.level_),
+      changeMark_(other.changeMark_),
+      open_(std::exchange(other.open_, false)) {}
 
 Transaction& Transaction::operator=(Transaction&& other) noexcept {
   if (this != &other) {
     cancel();
     model_ = std::move(other.model_);
     level_ = other.level_;
+    changeMark_ = other.changeMark_;
     open_ = std::exchange(other.open_, false);
   }
   return *this;
@@ -44,6 +49,10 @@ void Transaction::cancel() noexcept {
       model_->cancelLevel(model_->txn_->currentLevel());
     }
     if (!model_->txn_) return;
+  }
+  if (level_ < 0 && model_->txn_->changeCount == changeMark_) {
+    --model_->txn_->openCount;  // a joined operation that changed nothing
+    return;
   }
   model_->cancelLevel(level_);
 }

@@ -44,6 +44,9 @@ struct TransactionState {
   std::deque<ElementRecord> records;  // first-touch order
   std::vector<Level> levels;
   int openCount = 0;
+  // Counts recorded changes; a joined operation that failed before the count moved
+  // changed nothing and needs no abort.
+  std::uint64_t changeCount = 0;
   Phase phase = Phase::Open;
 
   int currentLevel() const noexcept { return static_cast<int>(levels.size()) - 1; }

@@ -17,6 +17,8 @@
 
 #include <boost/optional.hpp>
 
+#include <cstdint>
+
 namespace qf::zero {
 
 class Transaction {
@@ -43,10 +45,11 @@ class Transaction {
 
  private:
   friend class ModelImpl;
-  Transaction(ModelImpl* model, int level) noexcept;
+  Transaction(ModelImpl* model, int level, std::uint64_t changeMark = 0) noexcept;
 
   IntrusivePtr<ModelImpl> model_;
   int level_ = -1;  // savepoint level, or -1 when joined without one
+  std::uint64_t changeMark_ = 0;  // the model's change count when a joined transaction began
   bool open_ = false;
 };
 
