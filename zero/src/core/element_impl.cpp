@@ -527,7 +527,7 @@ ModelElement ModelElement::Impl::createProxy(ModelImpl* model, const meta::Class
   proxy->model_ = model;
   proxy->state_ = State::Proxy;
   proxy->proxyModelUri_ = id.modelUri;
-  if (model != nullptr) model->proxies_.emplace(id.elementId, proxy.get());
+  if (model != nullptr) model->proxies_.emplace(id.elementId, proxy);
   return ModelElement(proxy);
 }
 

@@ -87,6 +87,7 @@ std::vector<ModelElement> ModelImpl::getInstances(const meta::Class& metaClass,
 }
 
 void ModelImpl::registerElement(ModelElement::Impl* element) {
+  proxies_.erase(element->uuid_);
   elements_.emplace(element->uuid_, IntrusivePtr<ModelElement::Impl>(element));
   instances_[element->getMetaClass().getImpl()].emplace(element->serial_, element);
   updateTopLevel(element);

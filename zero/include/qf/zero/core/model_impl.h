@@ -129,7 +129,8 @@ class ModelImpl final : public RefCounted {
   std::unordered_map<Uuid, IntrusivePtr<ModelElement::Impl>, boost::hash<Uuid>> elements_;
   std::map<std::uint64_t, ModelElement::Impl*> topLevel_;
   std::unordered_map<const void*, std::map<std::uint64_t, ModelElement::Impl*>> instances_;
-  std::unordered_map<Uuid, ModelElement::Impl*, boost::hash<Uuid>> proxies_;
+  // Proxies made for elements not resident here; dropped once the element arrives.
+  std::unordered_map<Uuid, IntrusivePtr<ModelElement::Impl>, boost::hash<Uuid>> proxies_;
   std::uint64_t nextSerial_ = 1;
   std::unique_ptr<internal::TransactionState> txn_;
   std::vector<std::shared_ptr<ListenerHolderBase>> listeners_;
