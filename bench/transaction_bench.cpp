@@ -1,0 +1,71 @@
+// Commit cost of a transaction that changes k elements of a model of N elements.
+// The cost should follow k and not N: a commit touches only what changed.
+// Arguments: N, k, and the batch size of the transactions that built the model (0: one
+// transaction for all N).
+#include "qf/zero/core/meta/meta_registry.h"
+#include "qf/zero/core/model_impl.h"
+
+#include <benchmark/benchmark.h>
+
+#include <map>
+
+namespace {
+
+using namespace qf::zero;
+
+struct Counter {
+  Model metaModel = Model::create();
+  meta::Class item = meta::Class::create(metaModel, {}, u"Item", u"bench.Item", false);
+  meta::Property count = meta::Property::create(metaModel, {}, u"count", meta::ValueFlags::Single, false);
+  Counter() {
+    item->setSuperclass(ModelElement::metaClass());
+    count->setType(meta::MetaRegistry::getInstance().getPrimitiveType(u"Integer"));
+    count->setPropertyIndex(1);
+    item->addProperty(count);
+  }
+};
+
+struct ReportCounter : Listener {
+  std::size_t modified = 0;
+  void transactionCommitted(const std::shared_ptr<ShallowChangeReport<ModelElement>>& report) {
+    modified += report->getModified().size();
+  }
+};
+
+void commitOfKChangesInModelOfN(benchmark::State& state) {
+  const auto n = static_cast<std::size_t>(state.range(0));
+  const auto k = static_cast<std::size_t>(state.range(1));
+  static Counter counter;
+  Model model = Model::create();
+  std::vector<ModelElement> items;
+  // The model is built in transactions of `batch` creations. One huge transaction
+  // leaves many small blocks freed at once, which the allocator keeps paying for.
+  const auto batch = state.range(2) == 0 ? n : static_cast<std::size_t>(state.range(2));
+  for (std::size_t first = 0; first < n; first += batch) {
+    Transaction t = model->beginTransaction();
+    for (std::size_t i = first; i < std::min(n, first + batch); ++i) items.push_back(counter.item.instantiate(model));
+    t.commit();
+  }
+  ReportCounter listener;
+  model->addShallowListener(&listener);
+  int round = 0;
+  for (auto _ : state) {
+    ++round;
+    Transaction t = model->beginTransaction();
+    for (std::size_t i = 0; i < k; ++i) items[(i * 7919 + static_cast<std::size_t>(round)) % n].setPropertyValue(counter.count, Value::of(round));
+    t.commit();
+  }
+  model->removeListener(&listener);
+  state.counters["per_change_ns"] = benchmark::Counter(static_cast<double>(k),
+                                                       benchmark::Counter::kIsIterationInvariantRate |
+                                                           benchmark::Counter::kInvert);
+  benchmark::DoNotOptimize(listener.modified);
+}
+
+BENCHMARK(commitOfKChangesInModelOfN)
+    ->ArgsProduct({{1000, 10000, 100000}, {1, 10, 100}, {1000}})
+    ->Args({100000, 100, 0})
+    ->ArgNames({"N", "k", "batch"})
+    ->Unit(benchmark::kMicrosecond);
+
+}  // namespace
