@@ -117,6 +117,31 @@ TEST_F(Listeners, ADetachedListenerMissesTheRestOfTheTransaction) {
   model->removeListener(&second);
 }
 
+struct RemovalCounter : Journal {
+  int removals = 0;
+  void listenerRemoved() override { ++removals; }
+};
+
+TEST_F(Listeners, RemovalIsAnnouncedOnceAndMayHappenFromACallback) {
+  RemovalCounter self;
+  model->addShallowListener(&self);
+  self.onCommitted = [&](const Report&) { model->removeListener(&self); };
+  make();
+  EXPECT_EQ(self.removals, 1);
+  EXPECT_EQ(self.calls.size(), 3u);
+  make();
+  EXPECT_EQ(self.calls.size(), 3u) << "a removed listener must not hear of later commits";
+  model->removeListener(&self);
+  EXPECT_EQ(self.removals, 1) << "removing an absent listener announces nothing";
+
+  RemovalCounter survivor;
+  {
+    Model shortLived = Model::create();
+    shortLived->addDeepListener(&survivor);
+  }
+  EXPECT_EQ(survivor.removals, 1) << "a model going away releases its listeners";
+}
+
 TEST_F(Listeners, ReportsListElementsInFirstChangeOrderWithOldValues) {
   ModelElement a = make(), b = make(), c = make(), gone = make();
   tm.refs(a, tm.children)->add(c);

@@ -34,7 +34,9 @@ class RandomEditor {
     for (const ModelElement& e : live()) {
       const ModelElement parent = e.getPropertyValue(tm_.parent).getElement();
       ASSERT_EQ(parent, e.container());
-      if (parent) ASSERT_TRUE(tm_.refs(parent, tm_.children)->contains(e));
+      if (parent) {
+        ASSERT_TRUE(tm_.refs(parent, tm_.children)->contains(e));
+      }
       for (const ModelElement& child : tm_.refs(e, tm_.children)->getAllValues()) {
         ASSERT_EQ(child.container(), e);
         ASSERT_TRUE(child.isLive());
@@ -49,7 +51,9 @@ class RandomEditor {
         ASSERT_EQ(index->genericFind(member.getPropertyValue(tm_.name)).getElement(), member);
       }
       const ModelElement best = e.getPropertyValue(tm_.best).getElement();
-      if (best) ASSERT_TRUE(best.isLive());
+      if (best) {
+        ASSERT_TRUE(best.isLive());
+      }
     }
   }
 

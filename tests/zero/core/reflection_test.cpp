@@ -124,5 +124,22 @@ TEST_F(Reflection, InstanceQueriesFollowTheClassHierarchyInCreationOrder) {
   EXPECT_TRUE(model->getInstances(tm.leaf, query::SearchClassMatchMode::ExactClass).empty());
 }
 
+TEST_F(Reflection, QueriesFilterTheInstancesOfTheirAttachedClasses) {
+  ModelElement n1 = tm.node.instantiate(model), l1 = tm.leaf.instantiate(model), n2 = tm.node.instantiate(model);
+  tm.setName(n2, u"keep");
+  tm.setName(l1, u"keep");
+  query::PredicateQuery named(model, [&](const ModelElement& e) {
+    return e.getPropertyValue(tm.name).getValue<std::u16string>() == u"keep";
+  });
+  EXPECT_TRUE(named.evaluate().empty()) << "a query without attachments ranges over nothing";
+  {
+    ModelElement::Constrainables everything(named);
+    ModelElement::Constrainables leaves(named, tm.leaf, query::SearchClassMatchMode::ExactClass);
+    EXPECT_EQ(leaves.getInstances(), (std::vector<ModelElement>{l1}));
+    EXPECT_EQ(named.evaluate(), (std::vector<ModelElement>{l1, n2})) << "overlapping attachments list each once";
+  }
+  EXPECT_TRUE(named.evaluate().empty()) << "an attachment leaves its query when it goes";
+}
+
 }  // namespace
 }  // namespace qf::zero

@@ -7,6 +7,7 @@
 #include "qf/zero/core/element_impl.h"
 #include "qf/zero/core/listener.h"
 #include "qf/zero/core/model.h"
+#include "qf/zero/core/query.h"
 #include "qf/zero/core/transaction.h"
 
 #include <boost/functional/hash.hpp>
@@ -26,9 +27,6 @@ enum class FindElementBehavior {
   IncludeProxies  // also a proxy the model made for the UUID
 };
 
-namespace query {
-enum class SearchClassMatchMode { ExactClass, IncludeSubclasses };
-}
 
 // Opens transactions on one model; what the library uses on a user model.
 class TransactionFactory {
