@@ -55,6 +55,16 @@ TEST(Qf0Messages, EveryKeyHasATextAndAClassWhoseArgumentsFillItsPlaceholders) {
         messageRow<msg::CannotResolveProxy>("9f8e7d6c-5b4a-4321-8fed-cba987654321"),
         messageRow<msg::TypeAlreadyRegistered>(u"geo.Point"),
         messageRow<msg::ModelDestroyed>(),
+        messageRow<msg::MalformedDocument>("entries must be an array"),
+        messageRow<msg::UnsupportedFormatVersion>("2.0"),
+        messageRow<msg::WrongJsonType>(u"Widget.size", "a number", "a string"),
+        messageRow<msg::DanglingReference>(u"Widget.owner", "9f8e7d6c-5b4a-4321-8fed-cba987654321"),
+        messageRow<msg::ChannelClosed>("the peer went away"),
+        messageRow<msg::ExchangeFailed>("History", "the channel closed"),
+        messageRow<msg::MalformedPacket>("no type member"),
+        messageRow<msg::PacketTooLarge>(2000000, 1048576),
+        messageRow<msg::UnknownPacketType>("Gossip"),
+        messageRow<msg::ConnectionFailed>("127.0.0.1:9", "connection refused"),
     };
     EXPECT_EQ(msg::catalog().name(), "qf0:messages");
     support::checkCatalog(msg::catalog(), rows);

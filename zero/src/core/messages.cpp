@@ -35,6 +35,16 @@ constexpr CatalogEntry entries[] = {
     {"CannotResolveProxy", "Cannot resolve the proxy for element {1}."},
     {"TypeAlreadyRegistered", "The type '{1}' is already registered."},
     {"ModelDestroyed", "The model has been destroyed."},
+    {"MalformedDocument", "The document is malformed: {1}."},
+    {"UnsupportedFormatVersion", "The document format version '{1}' is not supported."},
+    {"WrongJsonType", "The value of '{1}' must be {2} but is {3}."},
+    {"DanglingReference", "The property '{1}' refers to element {2}, which is neither in the document nor in the model."},
+    {"ChannelClosed", "The channel is closed: {1}."},
+    {"ExchangeFailed", "No '{1}' reply arrived: {2}."},
+    {"MalformedPacket", "The packet is malformed: {1}."},
+    {"PacketTooLarge", "The packet of {1} bytes exceeds the limit of {2} bytes."},
+    {"UnknownPacketType", "No handler accepts packets of type '{1}'."},
+    {"ConnectionFailed", "Cannot connect to {1}: {2}."},
 };
 
 constexpr Catalog messagesCatalog{"qf0:messages", entries};

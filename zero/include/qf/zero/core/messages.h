@@ -45,4 +45,18 @@ FOUNDATION_MESSAGE(catalog, CannotResolveProxy, std::string)           // elemen
 FOUNDATION_MESSAGE(catalog, TypeAlreadyRegistered, std::u16string)     // qualified type name
 FOUNDATION_MESSAGE(catalog, ModelDestroyed)
 
+// Reading JSON documents and change reports.
+FOUNDATION_MESSAGE(catalog, MalformedDocument, std::string)                        // what is wrong, where
+FOUNDATION_MESSAGE(catalog, UnsupportedFormatVersion, std::string)                 // version found
+FOUNDATION_MESSAGE(catalog, WrongJsonType, std::u16string, std::string, std::string)  // property, expected, found
+FOUNDATION_MESSAGE(catalog, DanglingReference, std::u16string, std::string)        // property, element uuid text
+
+// Packets and channels.
+FOUNDATION_MESSAGE(catalog, ChannelClosed, std::string)                 // why
+FOUNDATION_MESSAGE(catalog, ExchangeFailed, std::string, std::string)   // reply type awaited, why
+FOUNDATION_MESSAGE(catalog, MalformedPacket, std::string)               // what is wrong
+FOUNDATION_MESSAGE(catalog, PacketTooLarge, std::int64_t, std::int64_t)  // size, limit
+FOUNDATION_MESSAGE(catalog, UnknownPacketType, std::string)             // packet type
+FOUNDATION_MESSAGE(catalog, ConnectionFailed, std::string, std::string)  // endpoint, why
+
 }  // namespace qf0::messages
