@@ -1,6 +1,7 @@
 #include "support/test_metamodel.h"
 
 #include "qf/zero/core/meta/framework_package.h"
+#include "qf/zero/core/meta/property_serializer.h"
 #include "qf/zero/core/text.h"
 
 #include <boost/date_time/posix_time/posix_time.hpp>
@@ -35,14 +36,18 @@ std::string text(const Value& v) {
   if (v.holds<int>()) return std::to_string(v.getValue<int>());
   if (v.holds<Uuid>()) return toText(v.getValue<Uuid>()).substr(0, 8);
   if (v.holds<DateTime>()) return boost::posix_time::to_iso_extended_string(v.getValue<DateTime>());
+  if (v.holds<bool>()) return v.getValue<bool>() ? "true" : "false";
+  if (v.holds<JsonValue>()) return v.getValue<JsonValue>().dump();
+  if (v.holds<Point>()) return "(" + std::to_string(v.getValue<Point>().x) + "," + std::to_string(v.getValue<Point>().y) + ")";
   return "?";
 }
 
-void dumpElement(std::ostringstream& out, const ModelElement& e) {
+void dumpElement(std::ostringstream& out, const ModelElement& e, bool includeTransient) {
   out << toUtf8(e.getMetaClass().getQualifiedName()) << ' ' << e.identifier().substr(0, 8) << " in "
       << (e.container() ? e.container().identifier().substr(0, 8) : std::string("-"));
   std::vector<ModelElement> contained;
   for (const meta::Property& p : e->allProperties()) {
+    if (p->isTransient() && !includeTransient) continue;
     out << ' ' << toUtf8(p.getName()) << '=';
     const Value v = e.getPropertyValue(p);
     if (!p->isMany()) {
@@ -63,8 +68,33 @@ void dumpElement(std::ostringstream& out, const ModelElement& e) {
     out << ']';
   }
   out << '\n';
-  for (const ModelElement& child : contained) dumpElement(out, child);
+  for (const ModelElement& child : contained) dumpElement(out, child, includeTransient);
 }
+
+// Points are written as {"x": .., "y": ..}.
+class PointSerializer final : public meta::DatatypeSerializer {
+ public:
+  PointSerializer(meta::Property x, meta::Property y) : x_(std::move(x)), y_(std::move(y)) {}
+  Value createDefault() const override { return Value::of(Point{}); }
+  Value getPropertyValue(const Value& datum, const meta::Property& property) const override {
+    const Point p = datum.getValue<Point>();
+    return Value::of(coordinate(p, property));
+  }
+  Value setPropertyValue(const Value& datum, const meta::Property& property, const Value& value) const override {
+    Point p = datum.getValue<Point>();
+    (property == x_ ? p.x : p.y) = value.getValue<int>();
+    (void)coordinate(p, property);
+    return Value::of(p);
+  }
+
+ private:
+  int coordinate(const Point& p, const meta::Property& property) const {
+    if (property == x_) return p.x;
+    if (property == y_) return p.y;
+    reportException(qf0::messages::NoSuchProperty(u"tm.Point", property.getName()));
+  }
+  meta::Property x_, y_;
+};
 
 }  // namespace
 
@@ -101,11 +131,41 @@ TestMetamodel::TestMetamodel() {
   code->setIsReadOnly(true);
   code->setIsSetOnce(true);
   weight = makeProperty(metaModel, leaf, u"weight", F::Single, false, integer, 12);
-  for (const meta::Type& type : {meta::Type(kindEnum), meta::Type(node), meta::Type(leaf)}) package->addType(type);
+
+  gadget = meta::Class::create(metaModel, {}, u"Gadget", u"tm.Gadget", false);
+  gadget->setSuperclass(leaf);
+  point = meta::DataType::create(metaModel, {}, u"Point", u"tm.Point");
+  pointX = meta::Property::create(metaModel, {}, u"x", F::Single, false);
+  pointY = meta::Property::create(metaModel, {}, u"y", F::Single, false);
+  for (auto& coordinate : {pointX, pointY}) {
+    coordinate->setType(integer);
+    point->addProperty(coordinate);
+  }
+  pointX->setPropertyIndex(1);
+  pointY->setPropertyIndex(2);
+  flag = makeProperty(metaModel, gadget, u"flag", F::Single, false, registry.getPrimitiveType(u"Boolean"), 13);
+  flag->setDefaultValue(u"true");
+  note = makeProperty(metaModel, gadget, u"note", F::Single, false, registry.getPrimitiveType(u"JsonValue"), 14);
+  scores = makeProperty(metaModel, gadget, u"scores", F::Sequence, false, integer, 15);
+  scores->setIsUnique(false);
+  scores->setIsOrdered(true);
+  spot = makeProperty(metaModel, gadget, u"spot", F::Optional, false, point, 16);
+  scratch = makeProperty(metaModel, gadget, u"scratch", F::Single, false, string, 17);
+  scratch->setIsTransient(true);
+
+  for (const meta::Type& type :
+       {meta::Type(kindEnum), meta::Type(node), meta::Type(leaf), meta::Type(gadget), meta::Type(point)}) {
+    package->addType(type);
+  }
   registry.registerRootPackage(package);
+  meta::PropertySerializerRegistry::getInstance().registerDatatypeSerializer(
+      point, std::make_unique<PointSerializer>(pointX, pointY));
 }
 
-TestMetamodel::~TestMetamodel() { meta::MetaRegistry::getInstance().unregisterRootPackage(u"/test/tm"); }
+TestMetamodel::~TestMetamodel() {
+  meta::PropertySerializerRegistry::getInstance().unregister(point);
+  meta::MetaRegistry::getInstance().unregisterRootPackage(u"/test/tm");
+}
 
 ReferenceCollection* TestMetamodel::refs(const ModelElement& e, const meta::Property& p) const {
   return e.getPropertyValue(p).getValue<ReferenceCollection*>();
@@ -119,10 +179,10 @@ void TestMetamodel::setName(ModelElement& e, const std::u16string& value) const 
   e.setPropertyValue(name, Value::of(value));
 }
 
-std::string dumpModel(const Model& model) {
+std::string dumpModel(const Model& model, bool includeTransient) {
   std::ostringstream out;
   out << model->getElementCount() << " elements\n";
-  for (const ModelElement& e : model->getTopLevelElements()) dumpElement(out, e);
+  for (const ModelElement& e : model->getTopLevelElements()) dumpElement(out, e, includeTransient);
   return out.str();
 }
 

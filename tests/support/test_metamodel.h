@@ -24,13 +24,27 @@ namespace support {
 //   9 index     map of Node keyed by "name"
 //  10 born      optional DateTime
 //  11 code      UUID, read-only and set-once
-// and class Leaf, a subclass of Node adding 12 weight (Integer).
+// class Leaf, a subclass of Node adding 12 weight (Integer), and class Gadget, a
+// subclass of Leaf adding the remaining kinds of attribute:
+//  13 flag      Boolean, default "true"
+//  14 note      JsonValue, single
+//  15 scores    ordered sequence of Integer
+//  16 spot      optional datatype Point {x, y: Integer}
+//  17 scratch   String, transient
+struct Point {
+  int x = 0;
+  int y = 0;
+  friend bool operator==(const Point&, const Point&) = default;
+};
+
 struct TestMetamodel {
   qf::zero::Model metaModel = qf::zero::Model::create();
   qf::zero::meta::Package package;
   qf::zero::meta::Enum kindEnum;
-  qf::zero::meta::Class node, leaf;
+  qf::zero::meta::Class node, leaf, gadget;
+  qf::zero::meta::DataType point;
   qf::zero::meta::Property name, count, kind, tags, children, parent, friends, best, index, born, code, weight;
+  qf::zero::meta::Property flag, note, scores, spot, scratch, pointX, pointY;
 
   TestMetamodel();
   ~TestMetamodel();
@@ -44,7 +58,8 @@ struct TestMetamodel {
 
 // Every live element (top-level first, then depth-first through containment), each
 // with its class, UUID, container and every property value. Two models with equal
-// dumps are equal as far as the reflective API can tell.
-std::string dumpModel(const qf::zero::Model& model);
+// dumps are equal as far as the reflective API can tell. Transient properties are
+// left out on request, for comparing a model with one read back from a document.
+std::string dumpModel(const qf::zero::Model& model, bool includeTransient = true);
 
 }  // namespace support

@@ -1,0 +1,106 @@
+// Property and datatype serializers: how values of a type are written to JSON and
+// read back, for the types whose form the JSON serializer cannot know by itself
+// (generated enumerations, datatypes, opaque pointer values).
+//
+//   registry.registerPropertySerializer(colourEnum, std::make_unique<DefaultPropertySerializer<Colour>>(colourEnum));
+//   registry.registerPropertySerializer(handleType, std::make_unique<TransientOnlyPropertySerializer<Handle>>());
+//
+// Like the metamodel registry, the serializer registry is filled while metamodels
+// are set up and read from any thread afterwards.
+#pragma once
+
+#include "qf/zero/core/meta/enum.h"
+#include "qf/zero/core/meta/structured_type.h"
+#include "qf/zero/core/value.h"
+
+#include <nlohmann/json.hpp>
+
+#include <map>
+#include <memory>
+#include <shared_mutex>
+#include <string>
+#include <string_view>
+#include <utility>
+
+namespace qf::zero::meta {
+
+class PropertySerializer {
+ public:
+  virtual ~PropertySerializer() = default;
+  // False for values that have no persistent form: such properties are never written
+  // and are left untouched when read.
+  virtual bool isSerializable() const noexcept { return true; }
+  virtual nlohmann::ordered_json toJson(const Value& value) const = 0;
+  // Raises "InvalidValue" when `json` is not a value of the type.
+  virtual Value fromJson(const nlohmann::ordered_json& json, const Property& property) const = 0;
+};
+
+// Reads and writes the properties of one datatype's values. Datatype values are
+// immutable, so a write returns the changed value.
+class DatatypeSerializer {
+ public:
+  virtual ~DatatypeSerializer() = default;
+  // The value a parse starts from before it sets the written properties.
+  virtual Value createDefault() const = 0;
+  // Both raise "NoSuchProperty" for a property the datatype does not have.
+  virtual Value getPropertyValue(const Value& datum, const Property& property) const = 0;
+  virtual Value setPropertyValue(const Value& datum, const Property& property, const Value& value) const = 0;
+};
+
+// Writes a C++ enumeration E as the name of its literal in `metaEnum`.
+template <class E>
+class DefaultPropertySerializer final : public PropertySerializer {
+ public:
+  explicit DefaultPropertySerializer(Enum metaEnum) : enum_(std::move(metaEnum)) {}
+
+  nlohmann::ordered_json toJson(const Value& value) const override {
+    const EnumLiteral literal = enum_->findLiteral(static_cast<int>(value.getValue<E>()));
+    if (!literal) reportException(qf0::messages::InvalidValue());
+    return toUtf8(literal.getName());
+  }
+  Value fromJson(const nlohmann::ordered_json& json, const Property& property) const override {
+    if (!json.is_string()) reportException(qf0::messages::InvalidValue());
+    const EnumLiteral literal = enum_->findLiteral(toUtf16(json.get_ref<const std::string&>()));
+    if (!literal) reportException(qf0::messages::InvalidValue());
+    return Value::createPrimitiveValue(property, static_cast<E>(literal.getValue()));
+  }
+
+ private:
+  Enum enum_;
+};
+
+// For values that live only in memory (handles to threads, sockets, callbacks).
+template <class T>
+class TransientOnlyPropertySerializer final : public PropertySerializer {
+ public:
+  bool isSerializable() const noexcept override { return false; }
+  nlohmann::ordered_json toJson(const Value&) const override { return nullptr; }
+  Value fromJson(const nlohmann::ordered_json&, const Property&) const override { return Value(); }
+};
+
+class PropertySerializerRegistry {
+ public:
+  static PropertySerializerRegistry& getInstance();
+
+  // `key` tells apart several serializers of one type; the JSON serializer asks for
+  // the empty key. A second registration under the same type and key replaces the first.
+  void registerPropertySerializer(const Type& type, std::unique_ptr<PropertySerializer> serializer,
+                                  std::u16string key = {});
+  void registerDatatypeSerializer(const DataType& type, std::unique_ptr<DatatypeSerializer> serializer);
+  // Removes every serializer registered for the type.
+  void unregister(const Type& type);
+
+  // Null when nothing is registered. The pointer stays valid until the type is
+  // unregistered or its serializer replaced.
+  const PropertySerializer* getPropertySerializer(const Type& type, std::u16string_view key = {}) const;
+  const DatatypeSerializer* getDatatypeSerializer(const DataType& type) const;
+
+ private:
+  PropertySerializerRegistry() = default;
+
+  mutable std::shared_mutex mutex_;
+  std::map<std::pair<const void*, std::u16string>, std::unique_ptr<PropertySerializer>, std::less<>> properties_;
+  std::map<const void*, std::unique_ptr<DatatypeSerializer>> datatypes_;
+};
+
+}  // namespace qf::zero::meta

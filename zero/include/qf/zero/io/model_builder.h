@@ -1,0 +1,45 @@
+// ModelBuilder: the object through which a parse creates and fills elements.
+//
+// The default builder creates a new element for every entry and stores values as a
+// builder does (read-only and set-once properties included). A subclass may reuse
+// elements that exist already, or refuse to create some.
+#pragma once
+
+#include "qf/zero/core/meta/structured_type.h"
+#include "qf/zero/core/model.h"
+#include "qf/zero/core/model_element.h"
+#include "qf/zero/core/value.h"
+#include "qf/zero/io/element_id.h"
+
+namespace qf::zero::io {
+
+class ModelBuilder {
+ public:
+  virtual ~ModelBuilder() = default;
+
+  // A new element of `metaClass` in `model` with the id's UUID (a fresh one when the id
+  // carries none). Raises "DuplicateElementId" when the model holds that UUID already.
+  virtual ModelElement instantiate(const Model& model, const meta::Class& metaClass, const ElementId& id);
+  // The value a datatype's parse starts from (the datatype serializer's default).
+  virtual Value instantiateDataType(const meta::DataType& type);
+  // The element of the model that a reference names, or a null handle.
+  virtual ModelElement findReference(const Model& model, const meta::Class& metaClass, const ElementId& id);
+
+  // Stores a single-valued property; storing the current value changes nothing.
+  virtual void setValue(ModelElement& element, const meta::Property& property, const Value& value);
+  // Adds one item to a many-valued property.
+  virtual void setObjectValue(ModelElement& element, const meta::Property& property, const Value& item);
+  // Empties a many-valued property before the parse refills it.
+  virtual void clearObjectValue(ModelElement& element, const meta::Property& property);
+  // The value written as null for an optional property.
+  virtual Value createEmptyOptionalValue(const meta::Property& property);
+};
+
+// Reuses the live element that has the entry's UUID, so that parsing into a model
+// that holds an element refreshes it in place.
+class ElementReusingModelBuilder : public ModelBuilder {
+ public:
+  ModelElement instantiate(const Model& model, const meta::Class& metaClass, const ElementId& id) override;
+};
+
+}  // namespace qf::zero::io

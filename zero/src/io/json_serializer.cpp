@@ -1,0 +1,226 @@
+#include "qf/zero/io/json_serializer.h"
+
+#include "attribute_codec.h"
+#include "qf/zero/core/model_impl.h"
+#include "qf/zero/core/primitive_collection.h"
+#include "qf/zero/core/reference_collection.h"
+#include "qf/zero/core/text.h"
+
+#include <nlohmann/json.hpp>
+
+#include <algorithm>
+#include <unordered_map>
+#include <unordered_set>
+
+namespace qf::zero::io {
+
+using nlohmann::ordered_json;
+
+namespace {
+
+ordered_json uuidJson(const ModelElement& element) { return element.identifier(); }
+
+ordered_json referencesJson(const ReferenceCollection& collection, bool ordered) {
+  std::vector<ModelElement> targets = collection.getAllValuesAndProxies();
+  if (!ordered) {
+    std::sort(targets.begin(), targets.end(),
+              [](const ModelElement& a, const ModelElement& b) { return a.getUuid() < b.getUuid(); });
+  }
+  ordered_json array = ordered_json::array();
+  for (const ModelElement& target : targets) array.push_back(uuidJson(target));
+  return array;
+}
+
+}  // namespace
+
+std::vector<ModelElement> SerializeCustomizer::getAggregateMembers(const ModelElement&) const { return {}; }
+
+std::vector<ModelElement> ContainmentAggregateCustomizer::getAggregateMembers(const ModelElement& element) const {
+  std::vector<ModelElement> children;
+  for (const meta::Property& property : element->allProperties()) {
+    if (!property->isContainment()) continue;
+    if (property->isMany()) {
+      auto* collection = static_cast<ReferenceCollection*>(element->basicGetCollection(property));
+      for (const ModelElement& child : collection->getAllValues()) children.push_back(child);
+    } else if (const Value child = element->basicGetValue(property); child.isElement()) {
+      children.push_back(child.getElement());
+    }
+  }
+  return children;
+}
+
+// Writes entries; keeps what it learns of each class (the properties to write and
+// how) for the serializer's life.
+class JSONSerializer::EntryWriter {
+ public:
+  EntryWriter(ModelTraverser& traverser, const SerializeCustomizer& customizer)
+      : traverser_(traverser), customizer_(customizer) {}
+
+  ordered_json write(const ModelElement& element) {
+    const ClassPlan& plan = planFor(element.getMetaClass());
+    ordered_json entry = ordered_json::object();
+    entry[JSONConstants::TYPE_ATTR] = plan.typeName;
+    entry[JSONConstants::ID_ATTR] = element.identifier();
+    ordered_json& content = entry[JSONConstants::CONTENT_ATTR] = ordered_json::object();
+    for (const PropertyPlan& property : plan.properties) writeProperty(*element.getImpl(), property, content);
+    return entry;
+  }
+
+ private:
+  struct PropertyPlan {
+    meta::Property property;
+    std::string name;
+    bool reference;
+    internal::AttributeCodec codec;
+    Value defaultValue;
+  };
+  struct ClassPlan {
+    std::string typeName;
+    std::vector<PropertyPlan> properties;
+  };
+
+  const ClassPlan& planFor(const meta::Class& metaClass) {
+    if (auto it = plans_.find(metaClass.getImpl()); it != plans_.end()) return it->second;
+    ClassPlan plan;
+    plan.typeName = toUtf8(metaClass.getQualifiedName());
+    for (const meta::Property& property : traverser_.getProperties(metaClass, PropertyCategory::All)) {
+      PropertyPlan entry{property, toUtf8(property.getName()), property->isReference(), {}, {}};
+      if (!entry.reference) {
+        entry.codec = internal::codecFor(property->getType());
+        if (entry.codec.kind == internal::AttributeKind::Opaque) continue;
+        if (!property->isMany()) entry.defaultValue = property->getDefaultValue();
+      }
+      plan.properties.push_back(std::move(entry));
+    }
+    return plans_.emplace(metaClass.getImpl(), std::move(plan)).first->second;
+  }
+
+  void writeProperty(const ModelElement::Impl& element, const PropertyPlan& plan, ordered_json& content) const {
+    const meta::Property& property = plan.property;
+    const bool skipDefaults = customizer_.shouldSkipDefaultValues();
+    if (property->isMany()) {
+      AbstractOwnedCollection* collection = element.basicGetCollection(property);
+      if (skipDefaults && collection->size() == 0) return;
+      if (plan.reference) {
+        content[plan.name] = referencesJson(*static_cast<ReferenceCollection*>(collection), property->isSequence());
+        return;
+      }
+      ordered_json array = ordered_json::array();
+      for (const Value& item : static_cast<PrimitiveCollection*>(collection)->getAllValues()) {
+        array.push_back(internal::writeAttribute(property, plan.codec, item));
+      }
+      if (!property->isSequence()) std::sort(array.begin(), array.end());
+      content[plan.name] = std::move(array);
+      return;
+    }
+    const Value value = element.basicGetValue(property);
+    if (plan.reference) {
+      if (skipDefaults && value.isEmpty()) return;
+      content[plan.name] = value.isElement() ? uuidJson(value.getElement()) : ordered_json(nullptr);
+      return;
+    }
+    if (skipDefaults && (value.isEmpty() || value == plan.defaultValue)) return;
+    content[plan.name] = internal::writeAttribute(property, plan.codec, value);
+  }
+
+  ModelTraverser& traverser_;
+  const SerializeCustomizer& customizer_;
+  std::unordered_map<const void*, ClassPlan> plans_;
+};
+
+JSONSerializer::JSONSerializer()
+    : JSONSerializer(std::make_unique<JSONModelTraverser>(), std::make_unique<SerializeCustomizer>()) {}
+
+JSONSerializer::JSONSerializer(std::unique_ptr<ModelTraverser> traverser,
+                               std::unique_ptr<SerializeCustomizer> customizer)
+    : traverser_(traverser ? std::move(traverser) : std::make_unique<JSONModelTraverser>()),
+      customizer_(customizer ? std::move(customizer) : std::make_unique<SerializeCustomizer>()),
+      writer_(std::make_unique<EntryWriter>(*traverser_, *customizer_)) {}
+
+JSONSerializer::~JSONSerializer() = default;
+
+ordered_json JSONSerializer::newDocument() const {
+  ordered_json document = ordered_json::object();
+  document[JSONConstants::VERSION_ATTR] = customizer_->getFormatVersion();
+  document[JSONConstants::ENTRIES_ATTR] = ordered_json::array();
+  return document;
+}
+
+void JSONSerializer::emit(ordered_json&& document, const SerializationOutput& output) const {
+  if (output.getJson() != nullptr) *output.getJson() = std::move(document);
+  if (output.getText() != nullptr) *output.getText() = document.dump();
+}
+
+ordered_json JSONSerializer::writeEntry(const ModelElement& element) { return writer_->write(element); }
+
+void JSONSerializer::serialize(const ModelElement& element, const SerializationOutput& output) {
+  serialize(std::vector<ModelElement>{element}, output);
+}
+
+void JSONSerializer::serialize(const std::vector<ModelElement>& elements, const SerializationOutput& output) {
+  ordered_json document = newDocument();
+  ordered_json& entries = document[JSONConstants::ENTRIES_ATTR];
+  std::unordered_set<ModelElement> written;
+  std::vector<ModelElement> pending;
+  for (const ModelElement& root : elements) {
+    pending.push_back(root);
+    while (!pending.empty()) {
+      const ModelElement element = std::move(pending.back());
+      pending.pop_back();
+      if (!element || !written.insert(element).second) continue;
+      entries.push_back(writer_->write(element));
+      std::vector<ModelElement> members = customizer_->getAggregateMembers(element);
+      pending.insert(pending.end(), members.rbegin(), members.rend());
+    }
+  }
+  emit(std::move(document), output);
+}
+
+void JSONSerializer::serialize(const Model& model, const SerializationOutput& output) {
+  ordered_json document = newDocument();
+  ordered_json& entries = document[JSONConstants::ENTRIES_ATTR];
+  const ContainmentAggregateCustomizer containment;
+  std::vector<ModelElement> pending;
+  for (const ModelElement& top : model->getTopLevelElements()) {
+    pending.push_back(top);
+    while (!pending.empty()) {
+      const ModelElement element = std::move(pending.back());
+      pending.pop_back();
+      entries.push_back(writer_->write(element));
+      std::vector<ModelElement> children = containment.getAggregateMembers(element);
+      pending.insert(pending.end(), children.rbegin(), children.rend());
+    }
+  }
+  emit(std::move(document), output);
+}
+
+void JSONSerializer::serialize(const Value& value, const SerializationOutput& output) {
+  ordered_json json;
+  const meta::Property& property = value.getMeta().getProperty();
+  if (value.isElement()) {
+    json = uuidJson(value.getElement());
+  } else if (value.holds<AbstractOwnedCollection*>()) {
+    auto* collection = value.getValue<AbstractOwnedCollection*>();
+    if (auto* references = dynamic_cast<ReferenceCollection*>(collection)) {
+      json = referencesJson(*references, property && property->isSequence());
+    } else {
+      json = ordered_json::array();
+      const internal::AttributeCodec codec = internal::codecFor(property->getType());
+      for (const Value& item : static_cast<PrimitiveCollection*>(collection)->getAllValues()) {
+        json.push_back(internal::writeAttribute(property, codec, item));
+      }
+    }
+  } else if (value.isList()) {
+    json = ordered_json::array();
+    for (const Value& item : value.getList()) {
+      ordered_json itemJson;
+      serialize(item, SerializationOutput::forIntermediateFormat(&itemJson));
+      json.push_back(std::move(itemJson));
+    }
+  } else if (property && !value.isEmpty()) {
+    json = internal::writeAttribute(property, internal::codecFor(property->getType()), value);
+  }
+  emit(std::move(json), output);
+}
+
+}  // namespace qf::zero::io
