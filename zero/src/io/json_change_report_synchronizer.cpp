@@ -88,10 +88,9 @@ void JSONChangeReportSynchronizer::applyChangeReportVerbatim(const ordered_json&
 }
 
 ordered_json JSONChangeReportSynchronizer::writeChangeReport(const ReportData& report, JSONSerializer& serializer) {
-  ordered_json result = ordered_json::object();
-  ordered_json& added = result[JSONConstants::ADDED_ATTR] = ordered_json::array();
-  ordered_json& modified = result[JSONConstants::MODIFIED_ATTR] = ordered_json::array();
-  ordered_json& destroyed = result[JSONConstants::DESTROYED_ATTR] = ordered_json::array();
+  ordered_json added = ordered_json::array();
+  ordered_json modified = ordered_json::array();
+  ordered_json destroyed = ordered_json::array();
   for (const ReportData::Entry& entry : report.getEntries()) {
     switch (entry.kind) {
       case ReportData::Kind::Added:
@@ -110,6 +109,12 @@ ordered_json JSONChangeReportSynchronizer::writeChangeReport(const ReportData& r
       }
     }
   }
+  // Members are added last: an ordered object keeps them in a vector, so a reference
+  // to one member does not survive the insertion of the next.
+  ordered_json result = ordered_json::object();
+  result[JSONConstants::ADDED_ATTR] = std::move(added);
+  result[JSONConstants::MODIFIED_ATTR] = std::move(modified);
+  result[JSONConstants::DESTROYED_ATTR] = std::move(destroyed);
   return result;
 }
 

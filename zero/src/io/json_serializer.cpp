@@ -1,11 +1,13 @@
 #include "qf/zero/io/json_serializer.h"
 
 #include "attribute_codec.h"
+#include "qf/zero/core/meta/framework_package.h"
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/primitive_collection.h"
 #include "qf/zero/core/reference_collection.h"
 #include "qf/zero/core/text.h"
 
+#include <boost/date_time/posix_time/posix_time.hpp>
 #include <nlohmann/json.hpp>
 
 #include <algorithm>
@@ -29,6 +31,17 @@ ordered_json referencesJson(const ReferenceCollection& collection, bool ordered)
   ordered_json array = ordered_json::array();
   for (const ModelElement& target : targets) array.push_back(uuidJson(target));
   return array;
+}
+
+// A value that does not say which property it belongs to, written by what it holds.
+ordered_json writeByHeldType(const Value& value) {
+  if (value.holds<std::u16string>()) return toUtf8(value.getValue<std::u16string>());
+  if (value.holds<int>()) return value.getValue<int>();
+  if (value.holds<bool>()) return value.getValue<bool>();
+  if (value.holds<JsonValue>()) return value.getValue<JsonValue>();
+  if (value.holds<Uuid>()) return toText(value.getValue<Uuid>());
+  if (value.holds<DateTime>()) return boost::posix_time::to_iso_extended_string(value.getValue<DateTime>());
+  return nullptr;
 }
 
 }  // namespace
@@ -219,6 +232,8 @@ void JSONSerializer::serialize(const Value& value, const SerializationOutput& ou
     }
   } else if (property && !value.isEmpty()) {
     json = internal::writeAttribute(property, internal::codecFor(property->getType()), value);
+  } else if (!value.isEmpty()) {
+    json = writeByHeldType(value);
   }
   emit(std::move(json), output);
 }
