@@ -47,6 +47,11 @@ ModelImpl::~ModelImpl() {
   std::vector<IntrusivePtr<ModelElement::Impl>> all;
   all.reserve(elements_.size());
   for (auto& [id, element] : elements_) all.push_back(element);
+  // Everything that could refer to an element dies with it: no incoming index needs
+  // keeping, and unlinking entry by entry would cost quadratic time on a target that
+  // many elements refer to.
+  for (auto& element : all) element->incoming_.clear();
+  for (auto& [id, proxy] : proxies_) proxy->incoming_.clear();
   for (auto& element : all) element->invalidate();
   for (auto& element : all) element->basicDetachFromModel();
   for (auto& [id, proxy] : proxies_) proxy->model_ = nullptr;
