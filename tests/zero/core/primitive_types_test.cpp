@@ -27,7 +27,9 @@ TEST_P(PrimitiveText, ParsesAndPrintsBack) {
   ASSERT_NE(traits, nullptr);
   const auto parsed = traits->parseText(c.text);
   ASSERT_EQ(parsed.has_value(), c.valid) << toUtf8(c.type) << " '" << toUtf8(c.text) << "'";
-  if (c.valid) EXPECT_EQ(traits->toText(*parsed), c.text);
+  if (c.valid) {
+    EXPECT_EQ(traits->toText(*parsed), c.text);
+  }
 }
 
 INSTANTIATE_TEST_SUITE_P(
