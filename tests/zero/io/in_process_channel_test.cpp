@@ -1,0 +1,23 @@
+#include "qf/zero/io/in_process_channel.h"
+
+#include <gtest/gtest.h>
+
+#include "support/channel_test_cases.h"
+
+namespace support {
+
+namespace {
+
+ChannelKind inProcessChannels() {
+    return {"InProcess", [] {
+                auto [a, b] = qf::zero::io::InProcessChannel::createPair();
+                return ChannelPair{a, b};
+            }};
+}
+
+}  // namespace
+
+INSTANTIATE_TEST_SUITE_P(InProcess, ChannelContract, testing::Values(inProcessChannels()), kindName);
+INSTANTIATE_TEST_SUITE_P(InProcess, PacketExchange, testing::Values(inProcessChannels()), kindName);
+
+}  // namespace support
