@@ -1,13 +1,16 @@
 // Defines a small metamodel at run time, edits a model in transactions, prints the
 // change report, cancels a transaction and shows the model restored, then writes the
 // model as a JSON document, reads it into a second model, and keeps that copy up to
-// date by applying the first model's change reports as JSON.
+// date by applying the first model's change reports as JSON, sent as packets between
+// the two ends of an in-process channel.
 #include "qf/zero/core/meta/meta_registry.h"
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/text.h"
+#include "qf/zero/io/in_process_channel.h"
 #include "qf/zero/io/json_change_report_synchronizer.h"
 #include "qf/zero/io/json_parser.h"
 #include "qf/zero/io/json_serializer.h"
+#include "qf/zero/io/packet_transport.h"
 
 #include <nlohmann/json.hpp>
 
@@ -89,9 +92,19 @@ int main() {
     t.commit();
   }
   std::cout << "the change report as JSON: " << printer.lastReport.dump() << "\n";
-  io::JSONChangeReportSynchronizer::applyChangeReportVerbatim(printer.lastReport, copy,
-                                                              std::make_unique<io::ModelBuilder>());
-  std::cout << "applied to the second model: title '" << titleIn(copy) << "'\n";
+
+  // The copy lives behind a packet transport; its handler runs on the receiving thread
+  // and is the only code that touches the copy meanwhile.
+  auto [near, far] = io::InProcessChannel::createPair();
+  io::PacketTransport sender(near), receiver(far);
+  receiver.setPacketHandler("ChangeReport", [&](const io::JSONPacket& packet) {
+    io::JSONChangeReportSynchronizer::applyChangeReportVerbatim(packet.getJson(), copy,
+                                                                std::make_unique<io::ModelBuilder>());
+    return boost::optional<io::JSONPacket>(io::JSONPacket("Applied", titleIn(copy)));
+  });
+  const io::JSONPacket reply = sender.sendAndExpectPacket(io::JSONPacket("ChangeReport", printer.lastReport), "Applied");
+  std::cout << "sent as a packet; the peer replied " << reply.getType() << ", title now "
+            << reply.getJson().dump() << "\n";
   model->removeListener(&printer);
   return 0;
 }
