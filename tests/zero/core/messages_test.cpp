@@ -65,6 +65,7 @@ TEST(Qf0Messages, EveryKeyHasATextAndAClassWhoseArgumentsFillItsPlaceholders) {
         messageRow<msg::PacketTooLarge>(2000000, 1048576),
         messageRow<msg::UnknownPacketType>("Gossip"),
         messageRow<msg::ConnectionFailed>("127.0.0.1:9", "connection refused"),
+        messageRow<msg::ListenFailed>("127.0.0.1:80", "address in use"),
     };
     EXPECT_EQ(msg::catalog().name(), "qf0:messages");
     support::checkCatalog(msg::catalog(), rows);

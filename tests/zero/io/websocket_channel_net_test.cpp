@@ -22,6 +22,7 @@ namespace {
 using qf::zero::io::WebSocketChannel;
 using qf::zero::io::WebSocketListener;
 using ConnectionFailed = Raised<qf0::messages::ConnectionFailed>;
+using ListenFailed = Raised<qf0::messages::ListenFailed>;
 
 // Accepted channels, handed over one at a time.
 class AcceptedChannels {
@@ -121,14 +122,14 @@ private:
 INSTANTIATE_TEST_SUITE_P(WebSocket, ChannelContract, testing::Values(webSocketChannels()), kindName);
 INSTANTIATE_TEST_SUITE_P(WebSocket, PacketExchange, testing::Values(webSocketChannels()), kindName);
 
-TEST(WebSocketChannel, ConnectingWhereNobodyListensOrToABadTargetRaisesConnectionFailed) {
+TEST(WebSocketChannel, ConnectingWhereNobodyListensOrListeningWhereSomeoneDoesFails) {
     std::uint16_t freePort = 0;
     {
         AcceptedChannels accepted;
         WebSocketListener listener("127.0.0.1", 0, accepted.handler());
         freePort = listener.getPort();
         EXPECT_THROW(WebSocketChannel::connect("127.0.0.1", freePort, "no-slash"), ConnectionFailed);
-        EXPECT_THROW(WebSocketListener("127.0.0.1", freePort, accepted.handler()), ConnectionFailed);
+        EXPECT_THROW(WebSocketListener("127.0.0.1", freePort, accepted.handler()), ListenFailed);
     }
     try {
         WebSocketChannel::connect("127.0.0.1", freePort);

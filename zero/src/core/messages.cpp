@@ -45,6 +45,7 @@ constexpr CatalogEntry entries[] = {
     {"PacketTooLarge", "The packet of {1} bytes exceeds the limit of {2} bytes."},
     {"UnknownPacketType", "No handler accepts packets of type '{1}'."},
     {"ConnectionFailed", "Cannot connect to {1}: {2}."},
+    {"ListenFailed", "Cannot listen on {1}: {2}."},
 };
 
 constexpr Catalog messagesCatalog{"qf0:messages", entries};

@@ -415,12 +415,12 @@ public:
 
     std::uint16_t port() const noexcept { return port_; }
 
-    // On the constructing thread, before launch(). Raises ConnectionFailed.
+    // On the constructing thread, before launch(). Raises ListenFailed.
     void listen(const std::string& address, std::uint16_t port) {
         const std::string endpoint = address + ":" + std::to_string(port);
         beast::error_code ec;
         const auto fail = [&](const char* step) {
-            reportException(qf0::messages::ConnectionFailed(endpoint, std::string(step) + ": " + ec.message()));
+            reportException(qf0::messages::ListenFailed(endpoint, std::string(step) + ": " + ec.message()));
         };
         tcp::endpoint local;
         const auto ip = asio::ip::make_address(address, ec);

@@ -58,5 +58,6 @@ FOUNDATION_MESSAGE(catalog, MalformedPacket, std::string)               // what 
 FOUNDATION_MESSAGE(catalog, PacketTooLarge, std::int64_t, std::int64_t)  // size, limit
 FOUNDATION_MESSAGE(catalog, UnknownPacketType, std::string)             // packet type
 FOUNDATION_MESSAGE(catalog, ConnectionFailed, std::string, std::string)  // endpoint, why
+FOUNDATION_MESSAGE(catalog, ListenFailed, std::string, std::string)      // endpoint, why
 
 }  // namespace qf0::messages

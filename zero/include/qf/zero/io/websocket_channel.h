@@ -57,7 +57,7 @@ public:
     using AcceptHandler = std::function<void(std::shared_ptr<SynchronizationChannel> channel)>;
 
     // Listens on address ("127.0.0.1", "::", "localhost", ...) and port; port 0 picks a free one
-    // (see getPort()). Raises ConnectionFailed when the address cannot be listened on.
+    // (see getPort()). Raises ListenFailed when the address cannot be listened on.
     WebSocketListener(const std::string& address, std::uint16_t port, AcceptHandler onAccept);
     ~WebSocketListener();
     WebSocketListener(const WebSocketListener&) = delete;
