@@ -23,9 +23,7 @@ class ReusingBuilder final : public ModelBuilder {
       : inner_(inner ? std::move(inner) : std::make_unique<ModelBuilder>()) {}
 
   ModelElement instantiate(const Model& model, const meta::Class& metaClass, const ElementId& id) override {
-    if (id.uuid) {
-      if (ModelElement existing = model->findElement(*id.uuid); existing && existing.isLive()) return existing;
-    }
+    if (ModelElement existing = findLiveElement(model, id)) return existing;
     return inner_->instantiate(model, metaClass, id);
   }
   Value instantiateDataType(const meta::DataType& type) override { return inner_->instantiateDataType(type); }

@@ -35,11 +35,15 @@ void ModelBuilder::clearObjectValue(ModelElement& element, const meta::Property&
 
 Value ModelBuilder::createEmptyOptionalValue(const meta::Property&) { return Value(); }
 
+ModelElement ModelBuilder::findLiveElement(const Model& model, const ElementId& id) {
+  if (!id.uuid) return ModelElement();
+  ModelElement existing = model->findElement(*id.uuid);
+  return existing && existing.isLive() ? existing : ModelElement();
+}
+
 ModelElement ElementReusingModelBuilder::instantiate(const Model& model, const meta::Class& metaClass,
                                                      const ElementId& id) {
-  if (id.uuid) {
-    if (ModelElement existing = model->findElement(*id.uuid); existing && existing.isLive()) return existing;
-  }
+  if (ModelElement existing = findLiveElement(model, id)) return existing;
   return ModelBuilder::instantiate(model, metaClass, id);
 }
 

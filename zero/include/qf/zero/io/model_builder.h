@@ -33,6 +33,11 @@ class ModelBuilder {
   virtual void clearObjectValue(ModelElement& element, const meta::Property& property);
   // The value written as null for an optional property.
   virtual Value createEmptyOptionalValue(const meta::Property& property);
+
+ protected:
+  // The live element of `model` that the id names, or a null handle: what builders that
+  // refresh elements in place reuse.
+  static ModelElement findLiveElement(const Model& model, const ElementId& id);
 };
 
 // Reuses the live element that has the entry's UUID, so that parsing into a model
