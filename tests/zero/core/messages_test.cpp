@@ -48,6 +48,7 @@ TEST(Qf0Messages, EveryKeyHasATextAndAClassWhoseArgumentsFillItsPlaceholders) {
         messageRow<msg::DuplicateElementId>("0b2c5a9e-3f1d-4c2b-9a8e-7d6c5b4a3f21"),
         messageRow<msg::NoSuchClass>(u"geo.Shape"),
         messageRow<msg::NoSuchOperation>(u"Widget", u"spin"),
+        messageRow<msg::NotImplemented>(u"shop.Widget.spin"),
         messageRow<msg::WrongArgumentCount>(u"spin", 2, 3),
         messageRow<msg::IndexOutOfRange>(17, 4),
         messageRow<msg::TransactionNotOpen>(),

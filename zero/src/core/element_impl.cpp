@@ -62,6 +62,23 @@ void ModelElement::Impl::checkModifiable() const {
   if (model_->isFrozen()) reportException(qf0::messages::CannotModifyFrozenModel());
 }
 
+void ModelElement::Impl::checkNotProxy() const {
+  if (isProxy()) reportException(qf0::messages::CannotModifyProxy());
+}
+
+ModelElement ModelElement::Impl::residentOf(const ModelElement& target) const {
+  if (!target.isProxy() || model_ == nullptr) return target;
+  ModelElement resident = model_->peekResolveProxy(this, target);
+  return resident ? resident : target;
+}
+
+void ModelElement::Impl::relinkIncoming(const ModelElement& oldTarget, const ModelElement& newTarget,
+                                        const meta::Property& property) {
+  if (oldTarget == newTarget) return;
+  if (oldTarget) oldTarget->basicUnlinkIncoming(this, property);
+  if (newTarget) newTarget->basicLinkIncoming(this, property);
+}
+
 void ModelElement::Impl::checkCircularContainment(const ModelElement& child) const {
   for (const Impl* up = this; up != nullptr; up = up->container_) {
     if (up == child.getImpl()) reportException(qf0::messages::CannotCreateCircularContainment());
@@ -394,6 +411,7 @@ void ModelElement::Impl::restoreFromStorage(Storage* storage, bool collections) 
     basicSetContainer(storage->getOldContainer().getImpl(), storage->getOldContainmentFeature());
   }
   for (int index : storage->changedIndexes()) {
+    if (!storage->holdsSlot(index)) continue;
     const meta::Property property = getPropertyByIndex(index);
     if (property->isMany() != collections) continue;
     if (collections) {

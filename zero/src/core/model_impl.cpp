@@ -14,6 +14,7 @@ namespace qf::zero {
 using internal::ElementRecord;
 using internal::TransactionState;
 
+Model::Model() noexcept = default;
 Model::Model(ModelImpl* impl) noexcept : impl_(impl) {}
 Model::Model(const Model& other) noexcept = default;
 Model::Model(Model&& other) noexcept = default;

@@ -46,12 +46,18 @@ void ModelElement::Impl::Storage::setOldValue(int index, Value value) {
   Slot& s = slot(index);
   s.value = std::move(value);
   s.isCollection = false;
+  s.present = true;
 }
 
 void ModelElement::Impl::Storage::setOldCollection(int index, std::vector<Value> items) {
   Slot& s = slot(index);
   s.items = std::move(items);
   s.isCollection = true;
+  s.present = true;
+}
+
+bool ModelElement::Impl::Storage::holdsSlot(int index) const {
+  return static_cast<std::size_t>(index) < slots_.size() && slots_[static_cast<std::size_t>(index)].present;
 }
 
 bool ModelElement::Impl::Storage::holdsCollection(int index) const {
@@ -78,6 +84,7 @@ void ModelElement::Impl::Storage::revertUnchanged(Impl* element) {
     setChanged(kContainerIndex, false);
   }
   for (int index : changedIndexes()) {
+    if (!holdsSlot(index)) continue;
     const meta::Property property = element->getPropertyByIndex(index);
     const bool same = holdsCollection(index)
                           ? element->basicGetCollection(property)->sameContents(oldCollection(index))
@@ -97,7 +104,7 @@ void ModelElement::Impl::Storage::mergeInto(Storage& outer) {
     outer.setChanged(kContainerIndex, true);
   }
   for (int index : changedIndexes()) {
-    if (outer.isChanged(index)) continue;
+    if (outer.isChanged(index) || !holdsSlot(index)) continue;
     outer.slot(index) = std::move(slot(index));
     outer.setChanged(index, true);
   }

@@ -70,6 +70,9 @@ class ModelElement::Impl : public RefCounted {
   // Raises "CannotCreateCircularContainment" when `child` is this element or one of
   // its containers, i.e. when containing it here would close a cycle.
   void checkCircularContainment(const ModelElement& child) const;
+  // Raises "CannotModifyProxy" when this element is a proxy: the first check of every
+  // setter and mutable getter.
+  void checkNotProxy() const;
   // Raises "CannotCreateCrossModelAssociation" when `target` lives in another model.
   void checkCompatibleModel(const Impl* target, const meta::Property& property) const;
 
@@ -146,6 +149,13 @@ class ModelElement::Impl : public RefCounted {
  protected:
   Impl() = default;
   ~Impl() override;
+
+  // Helpers of typed element classes.
+  // The resident element a proxy stands for, or `target` itself.
+  ModelElement residentOf(const ModelElement& target) const;
+  // Moves this element's entry in the incoming index from `oldTarget` to `newTarget`
+  // (either may be null): the bookkeeping of a raw store to a non-containment reference.
+  void relinkIncoming(const ModelElement& oldTarget, const ModelElement& newTarget, const meta::Property& property);
 
   // Registers a detached element in `model` under `id` (nil: a fresh UUID), inside the
   // model's open transaction or one of its own.

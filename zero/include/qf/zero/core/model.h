@@ -24,7 +24,8 @@ class Model {
   class Freezer;
   class Thawer;
 
-  Model() noexcept = default;
+  // Out of line, like the destructor: including this header does not need ModelImpl.
+  Model() noexcept;
   explicit Model(ModelImpl* impl) noexcept;
   Model(const Model& other) noexcept;
   Model(Model&& other) noexcept;

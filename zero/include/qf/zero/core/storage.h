@@ -6,6 +6,11 @@
 // getOldValue for change reports, restores the element on rollback, and at commit
 // revertUnchanged drops the bits of properties whose value came back to the old one:
 // a property changed and changed back is not a change.
+//
+// Generated element classes derive their own storage with typed slots for their
+// single-valued properties; they answer those indexes first and pass the rest on.
+// The generic slots below hold the others: `holdsSlot(index)` is false for an index
+// whose old value a derived storage keeps.
 #pragma once
 
 #include "qf/zero/core/element_impl.h"
@@ -37,6 +42,7 @@ class ModelElement::Impl::Storage {
   // Slots, written by Impl::copyValue.
   void setOldValue(int index, Value value);
   void setOldCollection(int index, std::vector<Value> items);
+  bool holdsSlot(int index) const;
   bool holdsCollection(int index) const;
   const Value& oldValue(int index) const;
   const std::vector<Value>& oldCollection(int index) const;
@@ -60,6 +66,7 @@ class ModelElement::Impl::Storage {
     Value value;
     std::vector<Value> items;
     bool isCollection = false;
+    bool present = false;
   };
   Slot& slot(int index);
 

@@ -58,4 +58,9 @@ class Enum::Impl : public Type::Impl {
 
 inline int EnumLiteral::getValue() const { return getImpl()->getValue(); }
 
+namespace internal {
+// Whether values of `type` are enumeration literals.
+inline bool isEnumType(const Type& type) { return static_cast<bool>(elementCast<Enum>(type)); }
+}  // namespace internal
+
 }  // namespace qf::zero::meta

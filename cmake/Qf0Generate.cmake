@@ -1,0 +1,48 @@
+include_guard(GLOBAL)
+
+# qf0_generate_metamodel(<out-sources-var> <description.json> <output-dir>)
+#
+# Runs the metamodel generator (tools/qf0gen) on a JSON description and returns the
+# generated C++ sources in <out-sources-var>. Headers land in <output-dir>/include,
+# which the caller adds to its target's include directories. The generator reruns
+# when the description or the generator changes; files whose text is unchanged keep
+# their time stamps, so nothing that includes them is rebuilt.
+find_package(Python3 3.8 REQUIRED COMPONENTS Interpreter)
+set(QF0GEN_DIR "${CMAKE_CURRENT_LIST_DIR}/../tools/qf0gen" CACHE INTERNAL "")
+
+function(qf0_generate_metamodel out_var description out_dir)
+    get_filename_component(description "${description}" ABSOLUTE)
+    execute_process(
+        COMMAND "${Python3_EXECUTABLE}" "${QF0GEN_DIR}/qf0gen.py" "${description}" --list
+        OUTPUT_VARIABLE listing
+        ERROR_VARIABLE errors
+        RESULT_VARIABLE result)
+    if(NOT result EQUAL 0)
+        message(FATAL_ERROR "${errors}")
+    endif()
+    set_property(DIRECTORY APPEND PROPERTY CMAKE_CONFIGURE_DEPENDS "${description}")
+
+    string(STRIP "${listing}" listing)
+    string(REPLACE "\n" ";" relative_paths "${listing}")
+    set(outputs "")
+    set(sources "")
+    foreach(path IN LISTS relative_paths)
+        list(APPEND outputs "${out_dir}/${path}")
+        if(path MATCHES "\\.cpp$")
+            list(APPEND sources "${out_dir}/${path}")
+        endif()
+    endforeach()
+
+    file(GLOB generator_files CONFIGURE_DEPENDS "${QF0GEN_DIR}/*.py" "${QF0GEN_DIR}/qf0gen/*.py")
+    get_filename_component(name "${description}" NAME_WE)
+    set(stamp "${out_dir}/${name}.stamp")
+    add_custom_command(
+        OUTPUT "${stamp}"
+        BYPRODUCTS ${outputs}
+        COMMAND "${Python3_EXECUTABLE}" "${QF0GEN_DIR}/qf0gen.py" "${description}" --out "${out_dir}"
+        COMMAND "${CMAKE_COMMAND}" -E touch "${stamp}"
+        DEPENDS "${description}" ${generator_files}
+        COMMENT "Generating the classes of ${name}"
+        VERBATIM)
+    set(${out_var} "${sources};${stamp}" PARENT_SCOPE)
+endfunction()
