@@ -151,7 +151,7 @@ meta::Property propertyNamed(const std::u16string& qualified) {
   return owner ? owner->findProperty(qualified.substr(dot + 1)) : meta::Property();
 }
 
-TEST(GeneratedClasses, TypedAndReflectiveAccessAgreeForEveryProperty) {
+TEST(GeneratedAccess, TypedAndReflectiveAccessAgreeForEveryProperty) {
   kiv::MetaPackageKiv::getInstance();
   std::set<std::u16string> covered;
   for (const Row& row : rows()) {
