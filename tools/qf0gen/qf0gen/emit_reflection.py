@@ -54,7 +54,8 @@ def reflection_source(d, cls):
                        _no_such_property(cls, "basicGetValue(property)"))
     lines += ["}", "", f"void {n}::Impl::basicSetValue(const {QZ}::meta::Property& property, const {QZ}::Value& value) {{"]
     lines += _dispatch(d, cls, single, lambda p: [f"basicSet{p.cap}(value.getValue<{member_type(p)}>());", "return;"],
-                       _no_such_property(cls, "basicSetValue(property, value)").replace("  return ", "  "))
+                       ("  (void)value;\n" if cls.superclass is None else "")
+                       + _no_such_property(cls, "basicSetValue(property, value)").replace("  return ", "  "))
     lines += ["}", "",
               f"{QZ}::AbstractOwnedCollection* {n}::Impl::basicGetCollection(const {QZ}::meta::Property& property) const {{"]
     lines += _dispatch(d, cls, many, lambda p: [f"return const_cast<{p.cap}Collection*>(&{member(p)});"],
