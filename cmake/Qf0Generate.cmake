@@ -8,12 +8,16 @@ include_guard(GLOBAL)
 # when the description or the generator changes; files whose text is unchanged keep
 # their time stamps, so nothing that includes them is rebuilt.
 find_package(Python3 3.8 REQUIRED COMPONENTS Interpreter)
+# The guard runs this once, in the first directory that includes it, and
+# find_package's results are variables of that directory; the function is called from
+# other directories too, so it reads the interpreter from the cache.
+set(QF0GEN_PYTHON "${Python3_EXECUTABLE}" CACHE INTERNAL "")
 set(QF0GEN_DIR "${CMAKE_CURRENT_LIST_DIR}/../tools/qf0gen" CACHE INTERNAL "")
 
 function(qf0_generate_metamodel out_var description out_dir)
     get_filename_component(description "${description}" ABSOLUTE)
     execute_process(
-        COMMAND "${Python3_EXECUTABLE}" "${QF0GEN_DIR}/qf0gen.py" "${description}" --list
+        COMMAND "${QF0GEN_PYTHON}" "${QF0GEN_DIR}/qf0gen.py" "${description}" --list
         OUTPUT_VARIABLE listing
         ERROR_VARIABLE errors
         RESULT_VARIABLE result)
@@ -39,7 +43,7 @@ function(qf0_generate_metamodel out_var description out_dir)
     add_custom_command(
         OUTPUT "${stamp}"
         BYPRODUCTS ${outputs}
-        COMMAND "${Python3_EXECUTABLE}" "${QF0GEN_DIR}/qf0gen.py" "${description}" --out "${out_dir}"
+        COMMAND "${QF0GEN_PYTHON}" "${QF0GEN_DIR}/qf0gen.py" "${description}" --out "${out_dir}"
         COMMAND "${CMAKE_COMMAND}" -E touch "${stamp}"
         DEPENDS "${description}" ${generator_files}
         COMMENT "Generating the classes of ${name}"

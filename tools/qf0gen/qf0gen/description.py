@@ -36,6 +36,13 @@ def _check_keys(where, data, allowed):
         _fail(where, f"unknown field(s) {', '.join(unknown)}")
 
 
+def _named(kind, position, item):
+    """Where a type is described: by its name, or by its position when it has none."""
+    if not item.get("name"):
+        _fail(f"{kind} {position + 1}", "needs a name")
+    return f"{kind} {item['name']}"
+
+
 class Package:
     def __init__(self, data, where):
         _check_keys(where, data, {"name", "uri", "parent", "imports", "namespace", "folder"})
@@ -170,10 +177,10 @@ class Argument:
 
 class Operation:
     def __init__(self, data, owner, where, resolve):
-        _check_keys(where, data, {"name", "args", "result", "const", "static", "virtual", "abstract", "invoker"})
         self.owner = owner
         self.name = data.get("name") or _fail(where, "an operation needs a name")
         where = f"{where}, operation {self.name}"
+        _check_keys(where, data, {"name", "args", "result", "const", "static", "virtual", "abstract", "invoker"})
         self.args = [Argument(a, f"{where}, argument {i + 1}", resolve) for i, a in enumerate(data.get("args", []))]
         self.result = TypeRef(data["result"], f"{where}, result", resolve) if data.get("result") else None
         self.is_const = data.get("const", False)
@@ -196,12 +203,12 @@ class Operation:
 
 class Property:
     def __init__(self, data, owner, where, resolve):
-        _check_keys(where, data, {"name", "index", "kind", "type", "composite", "ordered", "unique", "readOnly",
-                                  "setOnce", "transient", "publicAccessor", "publicMutator", "default", "opposite",
-                                  "key"})
         self.owner = owner
         self.name = data.get("name") or _fail(where, "a property needs a name")
         where = f"{where}, property {self.name}"
+        _check_keys(where, data, {"name", "index", "kind", "type", "composite", "ordered", "unique", "readOnly",
+                                  "setOnce", "transient", "publicAccessor", "publicMutator", "default", "opposite",
+                                  "key"})
         self.where = where
         self.index = data.get("index")
         self.kind = data.get("kind", "single")
@@ -312,6 +319,9 @@ class Description:
                                           "enums", "datatypes", "classes"})
         meta = data.get("metaPackage") or _fail("description", "needs 'metaPackage'")
         _check_keys("metaPackage", meta, {"class", "namespace", "includeDir"})
+        for key in ("class", "namespace", "includeDir"):
+            if not meta.get(key):
+                _fail("metaPackage", f"needs {key!r}")
         self.meta_class = meta["class"]
         self.namespace = meta["namespace"]
         self.include_dir = meta["includeDir"].rstrip("/")
@@ -349,21 +359,21 @@ class Description:
             self.types[type_.name] = type_
             return type_
 
-        for item in data.get("primitiveTypes", []):
-            where = f"primitive type {item.get('name')}"
+        for i, item in enumerate(data.get("primitiveTypes", [])):
+            where = _named("primitive type", i, item)
             t = add(PrimitiveType(item, package_of(item, where), where), where)
             t.package.primitives.append(t)
-        for item in data.get("enums", []):
-            where = f"enumeration {item.get('name')}"
+        for i, item in enumerate(data.get("enums", [])):
+            where = _named("enumeration", i, item)
             t = add(Enum(item, package_of(item, where), where), where)
             t.package.enums.append(t)
-        for item in data.get("datatypes", []):
-            where = f"datatype {item.get('name')}"
+        for i, item in enumerate(data.get("datatypes", [])):
+            where = _named("datatype", i, item)
             t = add(DataType(item, package_of(item, where), where), where)
             t.package.datatypes.append(t)
         self.classes = []
-        for item in data.get("classes", []):
-            where = f"class {item.get('name')}"
+        for i, item in enumerate(data.get("classes", [])):
+            where = _named("class", i, item)
             t = add(Class(item, package_of(item, where), where), where)
             t.package.classes.append(t)
             self.classes.append(t)
@@ -412,8 +422,14 @@ class Description:
                 _fail(cls.where, f"unknown superclass {cls.super_name!r}")
             cls.superclass = superclass
         for cls in self.classes:
-            if cls in cls.ancestors():
-                _fail(cls.where, "the superclass chain is a cycle")
+            # Every class on a cycle is checked here, before anything walks its ancestors.
+            current, seen = cls.superclass, set()
+            while current is not None and current not in seen:
+                if current is cls:
+                    _fail(cls.where, "the superclass chain is a cycle")
+                seen.add(current)
+                current = current.superclass
+        for cls in self.classes:
             inherited = {o.name: o for o in (cls.superclass.all_operations() if cls.superclass else [])}
             for name in cls.data.get("overrides", []):
                 base = inherited.get(name)

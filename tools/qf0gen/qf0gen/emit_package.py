@@ -2,7 +2,7 @@
 
 from . import files
 from .cpp import by_value, ns_close, ns_open, package_getter, typeref, u16
-from .description import KINDS
+from .description import KINDS, FrameworkType
 
 QZ = "qf::zero"
 META = "qf::zero::meta"
@@ -53,7 +53,9 @@ def header(d):
 
 
 def _framework_types(d):
-    seen = {}
+    """The framework types the package looks up: those its members name, and Integer,
+    the underlying type of every enumeration."""
+    seen = {"Integer": FrameworkType("Integer")} if d.enums else {}
     for t in d.types.values():
         for p in getattr(t, "properties", []):
             if p.type.package is None:
@@ -213,8 +215,7 @@ def _link(d):
                     if a.type.many:
                         lines.append(f"  {m}->getArguments()[{i}]->setUpper(-1);")
     for e in d.enums:
-        lines.append(f"  {e.name}_->setUnderlyingType(frameworkInteger_);" if "Integer" in
-                     {t.name for t in _framework_types(d)} else f"  (void){e.name}_;")
+        lines.append(f"  {e.name}_->setUnderlyingType(frameworkInteger_);")
     lines += ["}", ""]
     return lines
 
