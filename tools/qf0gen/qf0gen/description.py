@@ -282,14 +282,13 @@ class Class(StructuredType):
 
     def __init__(self, data, package, where):
         _check_keys(where, data, {"name", "package", "super", "abstract", "properties", "operations", "overrides",
-                                  "declarations", "implementation"})
+                                  "declarations"})
         super().__init__(data, package, where)
         self.super_name = data.get("super", "ModelElement")
         self.superclass = None
         self.is_abstract = data.get("abstract", False)
         self.overrides = []
         self.declarations = data.get("declarations", [])
-        self.implementation = data.get("implementation")
 
     def ancestors(self):
         result, current = [], self.superclass

@@ -1,7 +1,7 @@
 """Forward declarations, enumerations and datatypes."""
 
 from . import files
-from .cpp import member, member_type, ns_close, ns_open, param, u16
+from .cpp import member, member_type, ns_close, ns_open, op_params, param, result_decl, u16
 
 
 def fwd(d):
@@ -39,7 +39,6 @@ def datatype_header(d, t):
         lines += [f"  {getter_type} get{p.cap}() const noexcept {{ return {member(p)}; }}",
                   f"  void set{p.cap}({param(p)} value) {{ {member(p)} = value; }}"]
     for op in t.operations:
-        from .cpp import op_params, result_decl
         const = " const" if op.is_const else ""
         lines.append(f"  {result_decl(op)} {op.name}({op_params(op)}){const};")
     lines += [f"  friend bool operator==(const {t.name}&, const {t.name}&) = default;", "", " private:"]
