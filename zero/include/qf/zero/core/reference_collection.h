@@ -102,6 +102,7 @@ struct ReferenceStore;
 template <class T>
 struct ReferenceStore<T, std::vector<T>> {
   static constexpr bool ordered = true;
+  static constexpr bool keyed = false;
   std::vector<T> items;
   std::unordered_map<const ModelElement::Impl*, std::size_t> counts;  // fast membership
 
@@ -139,18 +140,14 @@ struct ReferenceStore<T, std::vector<T>> {
 template <class T>
 struct ReferenceStore<T, std::unordered_set<T>> {
   static constexpr bool ordered = false;
+  static constexpr bool keyed = false;
   std::unordered_set<T> items;
 
-  bool contains(const ModelElement::Impl* e) const {
-    return std::find_if(items.begin(), items.end(), [e](const T& x) { return x.getImpl() == e; }) != items.end();
-  }
+  // Handles hash by identity, so a handle made from the implementation finds it.
+  bool contains(const ModelElement::Impl* e) const { return items.count(handleOf(e)) != 0; }
   bool insert(std::size_t, const T& e, const MapKey&) { return items.insert(e).second; }
-  bool erase(const ModelElement::Impl* e) {
-    auto it = std::find_if(items.begin(), items.end(), [e](const T& x) { return x.getImpl() == e; });
-    if (it == items.end()) return false;
-    items.erase(it);
-    return true;
-  }
+  bool erase(const ModelElement::Impl* e) { return items.erase(handleOf(e)) != 0; }
+  static T handleOf(const ModelElement::Impl* e) { return T(const_cast<ModelElement::Impl*>(e)); }
   std::optional<std::size_t> indexOf(const ModelElement::Impl* e) const {
     std::size_t i = 0;
     for (const T& x : items) {
@@ -176,18 +173,23 @@ struct ReferenceStore<T, std::unordered_set<T>> {
 template <class T, class K>
 struct ReferenceStore<T, std::map<K, T>> {
   static constexpr bool ordered = false;
+  static constexpr bool keyed = true;
   std::map<K, T> items;
 
-  bool contains(const ModelElement::Impl* e) const {
-    return std::find_if(items.begin(), items.end(), [e](const auto& kv) { return kv.second.getImpl() == e; }) !=
-           items.end();
-  }
+  // `key` is the item's current key, where it is normally stored: looked up first, then
+  // the whole map is searched, for an item stored under another key (a proxy, or an item
+  // whose key changed while it was held raw).
+  bool contains(const ModelElement::Impl* e, const MapKey& key) const { return locate(e, key) != items.end(); }
   bool insert(std::size_t, const T& e, const MapKey& key) { return items.emplace(mapKeyAs<K>(key), e).second; }
-  bool erase(const ModelElement::Impl* e) {
-    auto it = std::find_if(items.begin(), items.end(), [e](const auto& kv) { return kv.second.getImpl() == e; });
+  bool erase(const ModelElement::Impl* e, const MapKey& key) {
+    auto it = locate(e, key);
     if (it == items.end()) return false;
     items.erase(it);
     return true;
+  }
+  typename std::map<K, T>::const_iterator locate(const ModelElement::Impl* e, const MapKey& key) const {
+    if (auto hit = items.find(mapKeyAs<K>(key)); hit != items.end() && hit->second.getImpl() == e) return hit;
+    return std::find_if(items.begin(), items.end(), [e](const auto& kv) { return kv.second.getImpl() == e; });
   }
   std::optional<std::size_t> indexOf(const ModelElement::Impl* e) const {
     std::size_t i = 0;
@@ -231,7 +233,13 @@ class TypedReferenceCollection : public ReferenceCollection {
   }
   const C& container() const noexcept { return store_.items; }
 
-  bool basicContains(const ModelElement::Impl* element) const override { return store_.contains(element); }
+  bool basicContains(const ModelElement::Impl* element) const override {
+    if constexpr (kKeyed) {
+      return store_.contains(element, keyOfImpl(element));
+    } else {
+      return store_.contains(element);
+    }
+  }
   ModelElement basicAt(std::size_t index) const override { return store_.at(index); }
   void basicForEach(const std::function<void(const ModelElement&)>& visit) const override {
     store_.forEach([&](const T& e) { visit(e); });
@@ -247,10 +255,21 @@ class TypedReferenceCollection : public ReferenceCollection {
     const MapKey key = getCollectionProperty()->isMap() ? keyOf(element) : MapKey();
     return store_.insert(position, typed, key);
   }
-  bool basicErase(const ModelElement::Impl* element) override { return store_.erase(element); }
+  bool basicErase(const ModelElement::Impl* element) override {
+    if constexpr (kKeyed) {
+      return store_.erase(element, keyOfImpl(element));
+    } else {
+      return store_.erase(element);
+    }
+  }
   void basicClear() override { store_.clear(); }
 
  private:
+  static constexpr bool kKeyed = internal::ReferenceStore<T, C>::keyed;
+  MapKey keyOfImpl(const ModelElement::Impl* element) const {
+    return this->keyOf(ModelElement(const_cast<ModelElement::Impl*>(element)));
+  }
+
   internal::ReferenceStore<T, C> store_;
 };
 
