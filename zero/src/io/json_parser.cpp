@@ -42,6 +42,7 @@ class JSONParser::Run {
     byUuid_.reserve(entries.size());
     for (std::size_t i = 0; i < entries.size(); ++i) instantiate(*entries[i], i);
     for (Entry& entry : entries_) readAttributes(entry);
+    for (Entry& entry : entries_) releaseChildren(entry);
     for (Entry& entry : entries_) readReferences(entry);
     std::vector<ParseItem> items;
     items.reserve(entries_.size());
@@ -185,6 +186,23 @@ class JSONParser::Run {
                                                readAttribute(memberProperty, memberCodec, memberJson));
     }
     return datum;
+  }
+
+  // Children that the document places anew are let go first, so that containment can be
+  // rebuilt in any entry order: with every written containment empty, each link made
+  // while references are read is one the document asks for, and only a document that
+  // is circular itself can make a circle.
+  void releaseChildren(Entry& entry) {
+    if (entry.content == nullptr) return;
+    for (const auto& [member, json] : entry.content->items()) {
+      const meta::Property& property = planFor(entry, member).property;
+      if (!property->isContainment() || !customizer_.shallReadProperty(entry.element, property)) continue;
+      if (property->isMany()) {
+        builder_.clearObjectValue(entry.element, property);
+      } else {
+        builder_.setValue(entry.element, property, builder_.createEmptyOptionalValue(property));
+      }
+    }
   }
 
   void readReferences(Entry& entry) {
