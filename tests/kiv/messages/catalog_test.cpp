@@ -17,6 +17,7 @@ namespace msg = kiv::messages;
 TEST(KivMessages, EveryKeyHasATextAndAClassWhoseArgumentsFillItsPlaceholders) {
     const std::vector<support::MessageRow> rows = {
         messageRow<msg::BranchExists>(u"f\u00e9ature"),
+        messageRow<msg::CannotAddParent>("5f0e9d8c-7b6a-4594-8372-615049382716"),
         messageRow<msg::CannotCheckout>(u"release/\U0001F680"),
         messageRow<msg::CannotCommit>(),
         messageRow<msg::CannotComposeZeroDeltas>(),

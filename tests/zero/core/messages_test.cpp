@@ -49,6 +49,7 @@ TEST(Qf0Messages, EveryKeyHasATextAndAClassWhoseArgumentsFillItsPlaceholders) {
         messageRow<msg::NoSuchClass>(u"geo.Shape"),
         messageRow<msg::NoSuchOperation>(u"Widget", u"spin"),
         messageRow<msg::NotImplemented>(u"shop.Widget.spin"),
+        messageRow<msg::ElementRequired>(u"shop.Widget.attach"),
         messageRow<msg::WrongArgumentCount>(u"spin", 2, 3),
         messageRow<msg::IndexOutOfRange>(17, 4),
         messageRow<msg::TransactionNotOpen>(),

@@ -28,6 +28,7 @@ constexpr CatalogEntry entries[] = {
     {"DuplicateElementId", "An element with the id {1} already exists in the model."},
     {"NoSuchClass", "The class '{1}' is not registered."},
     {"NoSuchOperation", "The type '{1}' has no operation '{2}'."},
+    {"ElementRequired", "The operation {1} needs a live element and was given none."},
     {"NotImplemented", "The operation {1} is not implemented in this version."},
     {"WrongArgumentCount", "The operation '{1}' takes {2} arguments but was given {3}."},
     {"IndexOutOfRange", "The index {1} is out of range for size {2}."},

@@ -12,6 +12,7 @@ namespace kiv::messages {
 const foundation::core::except::Catalog& catalog();
 
 FOUNDATION_MESSAGE(catalog, BranchExists, std::u16string)    // branch name
+FOUNDATION_MESSAGE(catalog, CannotAddParent, std::string)    // parent commit uuid text
 FOUNDATION_MESSAGE(catalog, CannotCheckout, std::u16string)  // branch name
 FOUNDATION_MESSAGE(catalog, CannotCommit)
 FOUNDATION_MESSAGE(catalog, CannotComposeZeroDeltas)

@@ -37,6 +37,8 @@ FOUNDATION_MESSAGE(catalog, CannotInstantiateAbstractClass, std::u16string)  // 
 FOUNDATION_MESSAGE(catalog, DuplicateElementId, std::string)                 // element uuid text
 FOUNDATION_MESSAGE(catalog, NoSuchClass, std::u16string)                     // qualified class name
 FOUNDATION_MESSAGE(catalog, NoSuchOperation, std::u16string, std::u16string)  // type name, operation name
+// An operation was given a null or destroyed element where it needs a live one.
+FOUNDATION_MESSAGE(catalog, ElementRequired, std::u16string)  // qualified operation name
 // An operation a metamodel declares but this build does not implement yet.
 FOUNDATION_MESSAGE(catalog, NotImplemented, std::u16string)  // qualified operation name
 FOUNDATION_MESSAGE(catalog, WrongArgumentCount, std::u16string, std::int64_t, std::int64_t)  // operation, expected, given
