@@ -1,84 +1,202 @@
 #include "kiv/metamodel/commit_impl.h"
 
-#include "qf/zero/core/messages.h"
-#include "qf/zero/core/report_exception.h"
+#include "history/history_support.h"
+#include "kiv/messages/messages.h"
+#include "kiv/metamodel/delta_impl.h"
+#include "kiv/metamodel/object_storage_impl.h"
+
+#include <algorithm>
+#include <unordered_set>
 
 namespace kiv {
 
-bool Commit::Impl::isInitial() const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.isInitial"));
+namespace {
+
+Commit self(const Commit::Impl* commit) { return Commit(const_cast<Commit::Impl*>(commit)); }
+
+Delta deltaToRecordInto(Commit::Impl& commit) {
+  Delta delta = commit.getDelta();
+  if (history::isLive(delta)) return delta;
+  delta = Delta::create(commit.getModel());
+  commit.setDelta(delta);
+  return delta;
 }
 
-bool Commit::Impl::isMerge() const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.isMerge"));
+ObjectStorage storageOf(const Commit::Impl& commit, const qf::zero::ModelElement& element) {
+  const ObjectStorage storage = ObjectStorage::create(commit.getModel());
+  storage->setContent(element);
+  return storage;
 }
 
-bool Commit::Impl::isEmpty() const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.isEmpty"));
+// Whether `target` is `from` or one of its ancestors. Unlike the path walks this keeps a
+// visited set: it answers one question and must stay cheap on merge-heavy histories.
+bool reaches(const Commit& from, const Commit::Impl* target) {
+  std::vector<Commit> pending{from};
+  std::unordered_set<const Commit::Impl*> visited;
+  while (!pending.empty()) {
+    const Commit commit = std::move(pending.back());
+    pending.pop_back();
+    if (commit.getImpl() == target) return true;
+    if (!visited.insert(commit.getImpl()).second) continue;
+    const auto& parents = commit.getParents();
+    for (const qf::zero::ModelElement& parent : parents.getAllValuesAndProxies()) {
+      if (const Commit resolved = qf::zero::elementCast<Commit>(parents.resolveProxy(parent))) pending.push_back(resolved);
+    }
+  }
+  return false;
 }
 
-::kiv::Commit Commit::Impl::getParent() const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.getParent"));
+bool hasChildren(const Commit::Impl& commit) {
+  const void* parentsProperty = MetaPackageKiv::getInstance().getCommit_parents().getImpl();
+  for (const auto& incoming : commit.incomingReferences()) {
+    if (incoming.property == parentsProperty) return true;
+  }
+  return false;
 }
 
-void Commit::Impl::addParent(const ::kiv::Commit& /*parent*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.addParent"));
+}  // namespace
+
+bool Commit::Impl::isInitial() const { return parents_.size() == 0; }
+
+bool Commit::Impl::isMerge() const { return parents_.size() > 1; }
+
+bool Commit::Impl::isEmpty() const { return !history::isLive(getDelta()); }
+
+Commit Commit::Impl::getParent() const {
+  if (parents_.size() == 0) return {};
+  return qf::zero::elementCast<Commit>(parents_.resolveProxy(parents_.basicAt(0)));
 }
 
-::kiv::Delta Commit::Impl::diff(const ::kiv::Commit& /*predecessor*/) const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.diff"));
+// History must stay acyclic: the walks keep no visited set. Only a commit that already
+// has children can close a loop, so a new commit pays for no walk.
+void Commit::Impl::addParent(const Commit& parent) {
+  history::requireLive(parent, u"kiv.Commit.addParent");
+  if (parent.getImpl() == this || (hasChildren(*this) && reaches(parent, this))) {
+    qf::zero::reportException(messages::CannotAddParent(parent.identifier()));
+  }
+  qf::zero::Transaction transaction = history::beginTransactionOn(*this);
+  getParentsMutable().add(parent);
+  transaction.commit();
 }
 
-std::vector<kiv::Commit> Commit::Impl::findPath(const ::kiv::Commit& /*predecessor*/) const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.findPath"));
+void Commit::Impl::addCreated(const qf::zero::ModelElement& current) {
+  qf::zero::Transaction transaction = history::beginTransactionOn(*this);
+  const ObjectStorage storage = storageOf(*this, current);
+  deltaToRecordInto(*this)->addCreated(storage);
+  transaction.commit();
 }
 
-::kiv::Delta Commit::Impl::getSnapshot() const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.getSnapshot"));
+// The previous state is shared with the commit that recorded it, not copied.
+void Commit::Impl::addUpdated(const qf::zero::ModelElement& current) {
+  history::requireLive(current, u"kiv.Commit.addUpdated");
+  const ObjectStorage previous = find(current.getUuid());
+  if (!previous || previous->isEmpty()) {
+    qf::zero::reportException(messages::NoSuchElementCur(current.identifier()));
+  }
+  qf::zero::Transaction transaction = history::beginTransactionOn(*this);
+  const ObjectStorage storage = storageOf(*this, current);
+  deltaToRecordInto(*this)->addUpdated(previous, storage);
+  transaction.commit();
 }
 
-void Commit::Impl::addCreated(const qf::zero::ModelElement& /*current*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.addCreated"));
+void Commit::Impl::addDeleted(const qf::zero::ModelElement& current) {
+  qf::zero::Transaction transaction = history::beginTransactionOn(*this);
+  const ObjectStorage storage = storageOf(*this, current);
+  deltaToRecordInto(*this)->addDeleted(storage);
+  transaction.commit();
 }
 
-void Commit::Impl::addUpdated(const qf::zero::ModelElement& /*current*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.addUpdated"));
+// First parents only: a state recorded only on a merged-in side line is not found. A
+// snapshot holds the whole state, so the walk ends there.
+ObjectStorage Commit::Impl::find(const qf::zero::Uuid& uuid) const {
+  Commit commit = self(this);
+  while (history::isLive(commit)) {
+    const Delta delta = commit->getDelta();
+    if (history::isLive(delta)) {
+      if (ObjectStorage storage = delta->getCurrent(uuid)) return storage;
+      if (delta->getIsSnapshot()) return {};
+    }
+    commit = commit->getParent();
+  }
+  return {};
 }
 
-void Commit::Impl::addDeleted(const qf::zero::ModelElement& /*current*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.addDeleted"));
+// The deltas from this commit back along first parents to an initial commit or to the
+// first snapshot, composed most recent first. A commit without a delta contributes an
+// empty scratch delta that does not outlive the call.
+Delta Commit::Impl::getSnapshot() const {
+  qf::zero::Transaction transaction = history::beginTransactionOn(*this);
+  Delta scratch;
+  std::vector<Delta> deltas{getDelta()};
+  if (!history::isLive(deltas.front())) deltas.front() = scratch = Delta::create(getModel());
+  for (Commit commit = self(this); !commit->isInitial();) {
+    const Delta delta = commit->getDelta();
+    if (history::isLive(delta) && delta->getIsSnapshot()) break;
+    commit = commit->getParent();
+    if (!commit) break;
+    deltas.push_back(commit->getDelta());
+  }
+  const Delta snapshot = Delta::Impl::compose(deltas);
+  snapshot->setIsSnapshot(true);
+  if (scratch) scratch.destroy();
+  transaction.commit();
+  return snapshot;
 }
 
-::kiv::ObjectStorage Commit::Impl::find(const qf::zero::Uuid& /*uuid*/) const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.find"));
+// The change from the state at `other` to the state at this commit. Without a path back
+// to `other` it goes from other's state through nothing: this snapshot composed with the
+// inverse of other's. The intermediate snapshots are destroyed; the result shares their
+// storages, which belong to the recorded commits.
+Delta Commit::Impl::diff(const Commit& other) const {
+  history::requireLive(other, u"kiv.Commit.diff");
+  const std::vector<Commit> path = findPath(other);
+  qf::zero::Transaction transaction = history::beginTransactionOn(*this);
+  Delta result;
+  if (path.empty()) {
+    std::vector<Delta> deltas{getSnapshot()};
+    Delta theirs;
+    if (!other->isInitial()) {
+      theirs = other->getSnapshot();
+      deltas.push_back(theirs->invert());
+    }
+    result = Delta::Impl::compose(deltas);
+    for (Delta& scratch : deltas) scratch.destroy();
+    if (theirs) theirs.destroy();
+  } else {
+    // The last commit of the path is `other`, whose delta is part of its own state.
+    std::vector<Delta> deltas;
+    for (std::size_t i = 0; i + 1 < path.size(); ++i) deltas.push_back(path[i]->getDelta());
+    const bool anyRecorded = std::any_of(deltas.begin(), deltas.end(), [](const Delta& d) { return history::isLive(d); });
+    // Commits that recorded nothing compose to nothing.
+    result = deltas.empty() || anyRecorded ? Delta::Impl::compose(deltas) : Delta::create(getModel());
+  }
+  transaction.commit();
+  return result;
 }
 
-bool Commit::Impl::isPredecessorOf(const ::kiv::Commit& /*commit*/) const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.isPredecessorOf"));
+bool Commit::Impl::isEqual(const Commit& other) const {
+  if (!history::isLive(other) || other.getUuid() != getUuid()) return false;
+  const Delta mine = getDelta();
+  const Delta theirs = other->getDelta();
+  const bool sameDelta = history::isLive(mine) ? mine->isEqual(theirs) : !history::isLive(theirs);
+  return sameDelta && other->user_ == user_ && other->message_ == message_ && other->dateTime_ == dateTime_;
 }
 
-std::vector<std::vector<kiv::Commit>> Commit::Impl::findAllPaths() const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.findAllPaths"));
-}
-
-void Commit::Impl::selectInRange(const std::unordered_set<kiv::Commit>& /*predecessors*/, const std::unordered_set<kiv::Commit>& /*commits*/, std::unordered_set<kiv::Commit>& /*result*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.selectInRange"));
-}
-
-void Commit::Impl::select(const std::unordered_set<kiv::Commit>& /*commits*/, std::unordered_set<kiv::Commit>& /*result*/, int /*depth*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.select"));
-}
-
-std::vector<std::vector<kiv::Commit>> Commit::Impl::findPathHelper(const std::function<bool(const kiv::Commit&)>& /*pred*/) const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.findPathHelper"));
-}
-
-bool Commit::Impl::isEqual(const ::kiv::Commit& /*commit*/) const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.isEqual"));
-}
-
+// Storages shared with other deltas go too: callers wipe out only commits whose storages
+// nothing else needs.
 void Commit::Impl::wipeOut() {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Commit.wipeOut"));
+  qf::zero::Transaction transaction = history::beginTransactionOn(*this);
+  if (Delta delta = getDelta(); history::isLive(delta)) {
+    std::vector<ObjectStorage> storages = delta->getPrevious().getTypedValues();
+    const std::vector<ObjectStorage> currents = delta->getCurrent().getTypedValues();
+    storages.insert(storages.end(), currents.begin(), currents.end());
+    for (ObjectStorage& storage : storages) {
+      if (storage.isLive()) storage.destroy();
+    }
+    delta.destroy();
+  }
+  self(this).destroy();
+  transaction.commit();
 }
 
 }  // namespace kiv

@@ -1,12 +1,15 @@
 #include "kiv/metamodel/dependency_impl.h"
 
-#include "qf/zero/core/messages.h"
-#include "qf/zero/core/report_exception.h"
+#include "kiv/metamodel/repository_impl.h"
 
 namespace kiv {
 
+// The repository kind decides what loading means. A dependency that belongs to no
+// repository has nothing to load from.
 void Dependency::Impl::load() {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Dependency.load"));
+  if (const Repository repository = getRepository(); repository && repository.isLive()) {
+    repository->load(Dependency(this));
+  }
 }
 
 }  // namespace kiv

@@ -1,24 +1,65 @@
 #include "kiv/metamodel/object_storage_impl.h"
 
-#include "qf/zero/core/messages.h"
-#include "qf/zero/core/report_exception.h"
+#include "history/history_support.h"
+#include "kiv/history/element_reuse_model_builder.h"
+#include "qf/zero/core/value.h"
+#include "qf/zero/io/json_constants.h"
+#include "qf/zero/io/json_parser.h"
+#include "qf/zero/io/json_serializer.h"
+#include "qf/zero/io/parse_customizer.h"
+
+#include <nlohmann/json.hpp>
+
+#include <memory>
 
 namespace kiv {
 
-::kiv::ObjectStorage ObjectStorage::Impl::setContent(const qf::zero::ModelElement& /*element*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.ObjectStorage.setContent"));
+namespace {
+
+using qf::zero::io::JSONConstants;
+
+// Compact, without ASCII escaping: equal contents give byte-identical texts.
+std::string compactText(const qf::zero::JsonValue& content) { return content.dump(-1, ' ', false); }
+
+}  // namespace
+
+// The whole entry is written, default values included, so that replaying it resets
+// every property of an element that is refreshed in place.
+ObjectStorage ObjectStorage::Impl::setContent(const qf::zero::ModelElement& element) {
+  history::requireLive(element, u"kiv.ObjectStorage.setContent");
+  qf::zero::io::JSONSerializer serializer;
+  serializer.getCustomizer().setShouldSkipDefaultValues(false);
+  qf::zero::JsonValue entry = serializer.writeEntry(element);
+
+  qf::zero::Transaction transaction = history::beginTransactionOn(*this);
+  const auto& elementUuidProperty = MetaPackageKiv::getInstance().getObjectStorage_elementUUID();
+  // elementUUID is read-only to users; the storage itself names the element it holds.
+  assignValue(elementUuidProperty,
+              qf::zero::Value::createPrimitiveValue(elementUuidProperty, element.getUuid()),
+              /*initializing=*/true);
+  setContent(std::move(entry));
+  transaction.commit();
+  return ObjectStorage(this);
 }
 
-bool ObjectStorage::Impl::isEmpty() const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.ObjectStorage.isEmpty"));
+bool ObjectStorage::Impl::isEmpty() const { return !elementUUID_ || elementUUID_->is_nil(); }
+
+qf::zero::ModelElement ObjectStorage::Impl::instantiate(const qf::zero::Model& model) const {
+  if (!model) qf::zero::reportException(qf0::messages::CannotCreateWithoutModel());
+  qf::zero::JsonValue document = qf::zero::JsonValue::object();
+  document[JSONConstants::VERSION_ATTR] = JSONConstants::FORMAT_VERSION;
+  document[JSONConstants::ENTRIES_ATTR] = qf::zero::JsonValue::array();
+  document[JSONConstants::ENTRIES_ATTR].push_back(content_);
+  qf::zero::io::JSONParser parser(std::make_unique<qf::zero::io::ParseCustomizer>(),
+                                  std::make_unique<ElementReuseModelBuilder>());
+  parser.parseVerbatim(document, model);
+  return isEmpty() ? qf::zero::ModelElement() : model->findElement(*elementUUID_);
 }
 
-qf::zero::ModelElement ObjectStorage::Impl::instantiate(const qf::zero::Model& /*model*/) const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.ObjectStorage.instantiate"));
-}
-
-bool ObjectStorage::Impl::isEqual(const ::kiv::ObjectStorage& /*os*/) const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.ObjectStorage.isEqual"));
+bool ObjectStorage::Impl::isEqual(const ObjectStorage& other) const {
+  if (!history::isLive(other) || other.getUuid() != getUuid()) return false;
+  if (other->elementUUID_ != elementUUID_) return false;
+  return other.getImpl() == this || compactText(other->content_) == compactText(content_);
 }
 
 }  // namespace kiv
