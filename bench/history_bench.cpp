@@ -270,9 +270,10 @@ void findAllPathsOfMergeLine(benchmark::State& state) {
 // One call passes a second at about 20 merges.
 BENCHMARK(findAllPathsOfMergeLine)->DenseRange(1, 20)->ArgName("merges")->Unit(benchmark::kMillisecond);
 
-// A "no" from isPredecessorOf comes from the same walk as findAllPaths: findPath gives up
-// only when every path from the tip has ended without meeting the outsider. The same
-// holds for diff against a commit that is not an ancestor.
+// A "no" from isPredecessorOf (and from findPath, and so diff against a commit that is not
+// an ancestor) is answered by a walk with a visited set, not by the path walk: it stays
+// linear in the line's commits where the path walk would meet every one of the paths
+// counted here (a second and a half at 20 merges).
 void outsiderIsNotPredecessorOfMergeLineTip(benchmark::State& state) {
   const MergeLine line(static_cast<std::size_t>(state.range(0)));
   bool predecessor = false;
@@ -284,6 +285,6 @@ void outsiderIsNotPredecessorOfMergeLineTip(benchmark::State& state) {
   state.counters["paths"] = static_cast<double>(std::size_t{1} << state.range(0));
 }
 
-BENCHMARK(outsiderIsNotPredecessorOfMergeLineTip)->DenseRange(4, 20, 4)->ArgName("merges")->Unit(benchmark::kMillisecond);
+BENCHMARK(outsiderIsNotPredecessorOfMergeLineTip)->DenseRange(4, 20, 4)->ArgName("merges")->Unit(benchmark::kMicrosecond);
 
 }  // namespace

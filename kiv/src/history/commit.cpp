@@ -1,5 +1,6 @@
 #include "kiv/metamodel/commit_impl.h"
 
+#include "history/ancestry.h"
 #include "history/history_support.h"
 #include "kiv/messages/messages.h"
 #include "kiv/metamodel/delta_impl.h"
@@ -28,24 +29,6 @@ ObjectStorage storageOf(const Commit::Impl& commit, const qf::zero::ModelElement
   return storage;
 }
 
-// Whether `target` is `from` or one of its ancestors. Unlike the path walks this keeps a
-// visited set: it answers one question and must stay cheap on merge-heavy histories.
-bool reaches(const Commit& from, const Commit::Impl* target) {
-  std::vector<Commit> pending{from};
-  std::unordered_set<const Commit::Impl*> visited;
-  while (!pending.empty()) {
-    const Commit commit = std::move(pending.back());
-    pending.pop_back();
-    if (commit.getImpl() == target) return true;
-    if (!visited.insert(commit.getImpl()).second) continue;
-    const auto& parents = commit.getParents();
-    for (const qf::zero::ModelElement& parent : parents.getAllValuesAndProxies()) {
-      if (const Commit resolved = qf::zero::elementCast<Commit>(parents.resolveProxy(parent))) pending.push_back(resolved);
-    }
-  }
-  return false;
-}
-
 bool hasChildren(const Commit::Impl& commit) {
   const void* parentsProperty = MetaPackageKiv::getInstance().getCommit_parents().getImpl();
   for (const auto& incoming : commit.incomingReferences()) {
@@ -71,7 +54,7 @@ Commit Commit::Impl::getParent() const {
 // has children can close a loop, so a new commit pays for no walk.
 void Commit::Impl::addParent(const Commit& parent) {
   history::requireLive(parent, u"kiv.Commit.addParent");
-  if (parent.getImpl() == this || (hasChildren(*this) && reaches(parent, this))) {
+  if (parent.getImpl() == this || (hasChildren(*this) && history::reaches(parent, *this))) {
     qf::zero::reportException(messages::CannotAddParent(parent.identifier()));
   }
   qf::zero::Transaction transaction = history::beginTransactionOn(*this);

@@ -1,10 +1,12 @@
 // The walks over the commit graph: paths, ancestry, selection by depth and range.
 #include "kiv/metamodel/commit_impl.h"
 
+#include "history/ancestry.h"
 #include "history/history_support.h"
 
 #include <climits>
 #include <deque>
+#include <unordered_set>
 
 namespace kiv {
 
@@ -23,6 +25,23 @@ std::vector<Commit> parentsOf(const Commit& commit) {
 }
 
 }  // namespace
+
+namespace history {
+
+bool reaches(const Commit& from, const Commit::Impl& target) {
+  std::vector<Commit> pending{from};
+  std::unordered_set<const Commit::Impl*> visited;
+  while (!pending.empty()) {
+    const Commit commit = std::move(pending.back());
+    pending.pop_back();
+    if (commit.getImpl() == &target) return true;
+    if (!commit || !visited.insert(commit.getImpl()).second) continue;
+    for (Commit& parent : parentsOf(commit)) pending.push_back(std::move(parent));
+  }
+  return false;
+}
+
+}  // namespace history
 
 // The front path grows along first parents until it matches or reaches an initial commit;
 // the side lines of merges wait at the back in arrival order. No visited set: a commit
@@ -51,8 +70,10 @@ std::vector<Path> Commit::Impl::findPathHelper(const std::function<bool(const Co
   return finished;
 }
 
+// A target that is no ancestor is told apart first: the walk itself would only give up
+// after every path had ended, which is exponential in the merges on the way.
 Path Commit::Impl::findPath(const Commit& target) const {
-  if (!target) return {};
+  if (!target || !history::reaches(Commit(const_cast<Impl*>(this)), *target.getImpl())) return {};
   std::vector<Path> found = findPathHelper([&](const Commit& commit) { return commit == target; });
   if (found.size() == 1 && found.front().back() == target) return std::move(found.front());
   return {};
@@ -64,7 +85,7 @@ std::vector<Path> Commit::Impl::findAllPaths() const {
 
 // A commit is its own predecessor.
 bool Commit::Impl::isPredecessorOf(const Commit& other) const {
-  return history::isLive(other) && !other->findPath(Commit(const_cast<Impl*>(this))).empty();
+  return history::isLive(other) && history::reaches(other, *this);
 }
 
 // depth counts commits from the start of each path: 1 selects the commits themselves, a
