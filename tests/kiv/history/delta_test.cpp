@@ -116,6 +116,50 @@ INSTANTIATE_TEST_SUITE_P(, DeltaPresence, ::testing::ValuesIn(kPresenceCases),
                            return std::string(info.param.name);
                          });
 
+// A map may hold a proxy for a storage that is not resident. Until it resolves it is no
+// storage of the delta; every operation goes on without it.
+kiv::ObjectStorage proxyOf(const Model& model, const Uuid& storage) {
+  return qf::zero::elementCast<kiv::ObjectStorage>(ModelElement::Impl::createProxy(
+      model.getImpl(), kiv::ObjectStorage::metaClass(), qf::zero::ProxyId{storage, u""}));
+}
+
+TEST_F(Deltas, AnUnresolvedProxyEntryIsAbsent) {
+  const kiv::ObjectStorage a1 = stored(a, "a1");
+  const kiv::Delta delta = kiv::Delta::create(repository);
+  delta.addCreated(a1);
+  delta->getCurrentMutable().addProxy(proxyOf(repository, qf::zero::generateNewUuid()));
+
+  kiv::Delta inverse, composed;
+  JsonValue report;
+  EXPECT_NO_THROW(inverse = delta.invert());
+  EXPECT_NO_THROW(composed = kiv::Delta::compose({delta}));
+  EXPECT_NO_THROW(report = delta.toChangeReport());
+  if (inverse) {
+    EXPECT_EQ(previousOf(inverse), (StorageMap{{a, a1}}));
+  }
+  if (composed) {
+    EXPECT_EQ(currentOf(composed), (StorageMap{{a, a1}}));
+  }
+  if (!report.is_null()) {
+    EXPECT_EQ(report.at("added"), JsonValue::array({a1.getContent()}));
+  }
+}
+
+TEST_F(Deltas, AProxyEntryIsPresentOnceItsStorageArrives) {
+  const Uuid storageId = qf::zero::generateNewUuid();
+  const kiv::Delta delta = kiv::Delta::create(repository);
+  delta->getCurrentMutable().addProxy(proxyOf(repository, storageId));
+  const kiv::ObjectStorage arrived = kiv::ObjectStorage::Builder(repository)
+                                         .doSetElementUUID(a)
+                                         .doSetContent(JsonValue{{"state", "a1"}})
+                                         .create(storageId);
+
+  EXPECT_EQ(delta.getCurrent(a), arrived);
+  EXPECT_TRUE(delta.isCreated(a));
+  EXPECT_EQ(previousOf(delta.invert()), (StorageMap{{a, arrived}}));
+  EXPECT_EQ(delta.toChangeReport().at("added"), JsonValue::array({arrived.getContent()}));
+}
+
 // ---- building ------------------------------------------------------------------------
 
 TEST_F(Deltas, AddOperationsFillTheMapsTheirStatesName) {
