@@ -1,0 +1,243 @@
+// Object storages: the stored state of one user element, how two of them compare, and
+// how a stored state is turned back into a live element.
+#include "kiv/metamodel/delta_impl.h"
+#include "kiv/metamodel/object_storage_impl.h"
+#include "qf/zero/core/messages.h"
+#include "qf/zero/core/model_impl.h"
+#include "qf/zero/io/json_serializer.h"
+#include "support/test_metamodel.h"
+
+#include <gtest/gtest.h>
+
+#include <boost/date_time/gregorian/gregorian.hpp>
+#include <boost/optional.hpp>
+#include <boost/optional/optional_io.hpp>
+#include <boost/uuid/uuid_io.hpp>
+#include <nlohmann/json.hpp>
+
+#include <string>
+
+namespace {
+
+using foundation::core::except::Exception;
+using qf::zero::JsonValue;
+using qf::zero::Model;
+using qf::zero::ModelElement;
+using qf::zero::Uuid;
+using qf::zero::Value;
+
+class ObjectStorages : public ::testing::Test {
+ protected:
+  ModelElement gadgetNamed(const std::u16string& name) {
+    ModelElement gadget = tm.gadget.instantiate(user);
+    tm.setName(gadget, name);
+    return gadget;
+  }
+
+  static JsonValue fullEntryOf(const ModelElement& element) {
+    qf::zero::io::JSONSerializer serializer;
+    serializer.getCustomizer().setShouldSkipDefaultValues(false);
+    return serializer.writeEntry(element);
+  }
+
+  support::TestMetamodel tm;
+  Model user = Model::create();
+  Model repository = Model::create();
+};
+
+TEST_F(ObjectStorages, IsEmptyUnlessItNamesAnElement) {
+  EXPECT_TRUE(kiv::ObjectStorage::create(repository).isEmpty()) << "no element UUID";
+  EXPECT_TRUE(kiv::ObjectStorage::Builder(repository).doSetElementUUID(Uuid()).create().isEmpty()) << "nil UUID";
+  EXPECT_FALSE(
+      kiv::ObjectStorage::Builder(repository).doSetElementUUID(qf::zero::generateNewUuid()).create().isEmpty());
+  EXPECT_FALSE(kiv::ObjectStorage::create(repository).setContent(gadgetNamed(u"g")).isEmpty());
+}
+
+TEST_F(ObjectStorages, SetContentStoresTheWholeEntryDefaultsIncluded) {
+  const ModelElement gadget = gadgetNamed(u"g");
+  const kiv::ObjectStorage storage = kiv::ObjectStorage::create(repository);
+  EXPECT_EQ(storage.setContent(gadget), storage);
+  EXPECT_EQ(storage.getElementUUID(), gadget.getUuid());
+  EXPECT_EQ(storage.getContent(), fullEntryOf(gadget));
+  const JsonValue& content = storage.getContent().at("content");
+  EXPECT_EQ(content.at("count"), 7) << "a default value is written too";
+  EXPECT_EQ(content.at("flag"), true);
+  EXPECT_EQ(content.at("tags"), JsonValue::array());
+  EXPECT_EQ(content.at("children"), JsonValue::array());
+
+  // Storing another element re-keys the storage, also in a map that holds it.
+  const ModelElement other = gadgetNamed(u"h");
+  kiv::Delta delta = kiv::Delta::create(repository);
+  delta.addCreated(storage);
+  storage.setContent(other);
+  EXPECT_EQ(storage.getElementUUID(), other.getUuid());
+  EXPECT_EQ(storage.getContent(), fullEntryOf(other));
+  EXPECT_EQ(delta.getCurrent(other.getUuid()), storage);
+  EXPECT_FALSE(delta.getCurrent(gadget.getUuid()));
+}
+
+TEST_F(ObjectStorages, SetContentOfNoElementRaisesAndChangesNothing) {
+  const ModelElement gadget = gadgetNamed(u"g");
+  const kiv::ObjectStorage storage = kiv::ObjectStorage::create(repository).setContent(gadget);
+  const std::string before = support::dumpModel(repository);
+  EXPECT_THROW(storage.setContent(ModelElement()), Exception<qf0::messages::ElementRequired>);
+  ModelElement gone = gadgetNamed(u"gone");
+  gone.destroy();
+  EXPECT_THROW(storage.setContent(gone), Exception<qf0::messages::ElementRequired>);
+  EXPECT_EQ(support::dumpModel(repository), before);
+  EXPECT_EQ(storage.getContent(), fullEntryOf(gadget));
+}
+
+TEST_F(ObjectStorages, InstantiateCreatesTheStoredElementUnderItsUuid) {
+  ModelElement gadget = gadgetNamed(u"g");
+  gadget.setPropertyValue(tm.count, Value::of(3));
+  gadget.setPropertyValue(tm.spot, Value::of(support::Point{1, -2}));
+  gadget.setPropertyValue(tm.note, Value::of(JsonValue{{"n", 1}}));
+  gadget.setPropertyValue(tm.born, Value::of(qf::zero::DateTime(boost::gregorian::date(2021, 3, 4))));
+  tm.values(gadget, tm.tags)->genericAdd(Value::of(std::u16string(u"t")));
+  tm.values(gadget, tm.scores)->genericAdd(Value::of(5));
+  tm.values(gadget, tm.scores)->genericAdd(Value::of(5));
+  const kiv::ObjectStorage storage = kiv::ObjectStorage::create(repository).setContent(gadget);
+
+  const Model fresh = Model::create();
+  const ModelElement made = storage.instantiate(fresh);
+  ASSERT_TRUE(made);
+  EXPECT_EQ(made.getUuid(), gadget.getUuid());
+  EXPECT_EQ(made.getModel(), fresh);
+  EXPECT_EQ(support::dumpModel(fresh, /*includeTransient=*/false), support::dumpModel(user, false));
+}
+
+// Replaying a stored state onto the element it came from resets every property, each
+// many-valued one replaced rather than merged, and keeps both ends of references in step.
+TEST_F(ObjectStorages, InstantiateRefreshesAnExistingElementInPlace) {
+  ModelElement gadget = gadgetNamed(u"g");
+  const ModelElement child = gadgetNamed(u"child");
+  const ModelElement loose = gadgetNamed(u"loose");
+  const ModelElement oldFriend = gadgetNamed(u"old friend");
+  const ModelElement newFriend = gadgetNamed(u"new friend");
+  tm.refs(gadget, tm.children)->add(child);
+  tm.refs(gadget, tm.friends)->add(oldFriend);
+  tm.values(gadget, tm.tags)->genericAdd(Value::of(std::u16string(u"kept")));
+  tm.values(gadget, tm.scores)->genericAdd(Value::of(1));
+  tm.values(gadget, tm.scores)->genericAdd(Value::of(2));
+  gadget.setPropertyValue(tm.best, Value::createElementValue(oldFriend));
+  const kiv::ObjectStorage storage = kiv::ObjectStorage::create(repository).setContent(gadget);
+  const std::string stored = support::dumpModel(user, /*includeTransient=*/false);
+
+  {
+    qf::zero::Transaction transaction = user->beginTransaction();
+    tm.setName(gadget, u"renamed");
+    gadget.setPropertyValue(tm.count, Value::of(0));
+    gadget.setPropertyValue(tm.flag, Value::of(false));
+    gadget.setPropertyValue(tm.kind, Value::createElementValue(tm.kindEnum->getLiterals()[1]));
+    gadget.setPropertyValue(tm.spot, Value::of(support::Point{4, 4}));
+    gadget.setPropertyValue(tm.note, Value::of(JsonValue::array({1, 2})));
+    gadget.setPropertyValue(tm.best, Value::createElementValue(newFriend));
+    tm.values(gadget, tm.tags)->genericAdd(Value::of(std::u16string(u"added")));
+    tm.values(gadget, tm.scores)->genericAdd(Value::of(3));
+    tm.refs(gadget, tm.friends)->remove(oldFriend);
+    tm.refs(gadget, tm.friends)->add(newFriend);
+    tm.refs(gadget, tm.children)->add(loose);
+    transaction.commit();
+  }
+  const std::size_t count = user->getElementCount();
+
+  EXPECT_EQ(storage.instantiate(user), gadget) << "the element is refreshed, not made anew";
+  EXPECT_EQ(user->getElementCount(), count);
+  EXPECT_EQ(support::dumpModel(user, false), stored);
+  EXPECT_TRUE(tm.refs(oldFriend, tm.friends)->contains(gadget));
+  EXPECT_FALSE(tm.refs(newFriend, tm.friends)->contains(gadget));
+}
+
+// Rows compare the storage `mine` (element E, content C) with another storage.
+struct EqualityCase {
+  const char* name;
+  bool expected;
+  kiv::ObjectStorage (*other)(const kiv::ObjectStorage& mine, const Model& elsewhere);
+};
+
+kiv::ObjectStorage twin(const kiv::ObjectStorage& mine, const Model& elsewhere, const boost::optional<Uuid>& element,
+                        const JsonValue& content) {
+  return kiv::ObjectStorage::Builder(elsewhere).doSetElementUUID(element).doSetContent(content).create(mine.getUuid());
+}
+
+const JsonValue kContent = {{"type", "tm.Node"}, {"id", "e"}, {"content", {{"name", "Zoë"}, {"count", 7}}}};
+
+const EqualityCase kEqualityCases[] = {
+    {"Itself", true, [](const kiv::ObjectStorage& mine, const Model&) { return mine; }},
+    {"NoStorage", false, [](const kiv::ObjectStorage&, const Model&) { return kiv::ObjectStorage(); }},
+    {"TwinElsewhere", true,
+     [](const kiv::ObjectStorage& mine, const Model& elsewhere) {
+       return twin(mine, elsewhere, mine.getElementUUID(), kContent);
+     }},
+    {"DestroyedTwin", false,
+     [](const kiv::ObjectStorage& mine, const Model& elsewhere) {
+       kiv::ObjectStorage gone = twin(mine, elsewhere, mine.getElementUUID(), kContent);
+       gone.destroy();
+       return gone;
+     }},
+    {"OwnUuidDiffers", false,
+     [](const kiv::ObjectStorage& mine, const Model&) {
+       return kiv::ObjectStorage::Builder(mine.getModel())
+           .doSetElementUUID(mine.getElementUUID())
+           .doSetContent(mine.getContent())
+           .create();
+     }},
+    {"ElementDiffers", false,
+     [](const kiv::ObjectStorage& mine, const Model& elsewhere) {
+       return twin(mine, elsewhere, qf::zero::generateNewUuid(), kContent);
+     }},
+    {"ElementMissing", false,
+     [](const kiv::ObjectStorage& mine, const Model& elsewhere) {
+       return twin(mine, elsewhere, boost::none, kContent);
+     }},
+    {"ValueDiffers", false,
+     [](const kiv::ObjectStorage& mine, const Model& elsewhere) {
+       JsonValue content = kContent;
+       content["content"]["count"] = 8;
+       return twin(mine, elsewhere, mine.getElementUUID(), content);
+     }},
+    {"MembersInAnotherOrder", false,
+     [](const kiv::ObjectStorage& mine, const Model& elsewhere) {
+       const JsonValue reordered = {{"type", "tm.Node"}, {"id", "e"}, {"content", {{"count", 7}, {"name", "Zoë"}}}};
+       return twin(mine, elsewhere, mine.getElementUUID(), reordered);
+     }},
+    {"IntegerWrittenAsFloat", false,
+     [](const kiv::ObjectStorage& mine, const Model& elsewhere) {
+       JsonValue content = kContent;
+       content["content"]["count"] = 7.0;
+       return twin(mine, elsewhere, mine.getElementUUID(), content);
+     }},
+};
+
+class ObjectStorageEquality : public ::testing::TestWithParam<EqualityCase> {};
+
+TEST_P(ObjectStorageEquality, Compares) {
+  const Model repository = Model::create();
+  const Model elsewhere = Model::create();
+  const kiv::ObjectStorage mine = kiv::ObjectStorage::Builder(repository)
+                                      .doSetElementUUID(qf::zero::generateNewUuid())
+                                      .doSetContent(kContent)
+                                      .create();
+  const kiv::ObjectStorage other = GetParam().other(mine, elsewhere);
+  EXPECT_EQ(mine.isEqual(other), GetParam().expected);
+  if (other && other.isLive()) {
+    EXPECT_EQ(other.isEqual(mine), GetParam().expected) << "symmetric";
+  }
+}
+
+TEST(ObjectStorageEqualityWithoutElement, NeedsBothElementUuidsAbsent) {
+  const Model repository = Model::create();
+  const Model elsewhere = Model::create();
+  const kiv::ObjectStorage mine = kiv::ObjectStorage::Builder(repository).doSetContent(kContent).create();
+  EXPECT_TRUE(mine.isEqual(twin(mine, elsewhere, boost::none, kContent)));
+  const Model third = Model::create();
+  EXPECT_FALSE(mine.isEqual(twin(mine, third, qf::zero::generateNewUuid(), kContent)));
+}
+
+INSTANTIATE_TEST_SUITE_P(, ObjectStorageEquality, ::testing::ValuesIn(kEqualityCases),
+                         [](const ::testing::TestParamInfo<EqualityCase>& info) {
+                           return std::string(info.param.name);
+                         });
+
+}  // namespace
