@@ -39,25 +39,40 @@ inline qf::zero::Uuid identityOf(const qf::zero::ModelElement& element) {
   return element.isProxy() ? element->getProxyId().elementId : element.getUuid();
 }
 
-// The entry the map holds for `uuid` when it is present: held, resolved and live. A
-// dangling, unresolved or destroyed entry counts as absent.
-inline ObjectStorage presentEntry(const StorageMap& map, const qf::zero::Uuid& uuid) {
-  const auto& items = map.container();
-  const auto it = items.find(uuid);
-  if (it == items.end()) return {};
-  if (it->second.isLive()) return it->second;
-  const qf::zero::ModelElement resolved = map.resolveProxy(it->second);
-  return isLive(resolved) ? qf::zero::elementCast<ObjectStorage>(resolved) : ObjectStorage();
+// The storage an entry stands for when it is present: live, or a proxy whose storage
+// is resident and live. Peeking loads nothing and raises nothing.
+inline ObjectStorage residentOf(const StorageMap& map, const ObjectStorage& held) {
+  if (held.isLive()) return held;
+  if (!held.isProxy()) return {};
+  const qf::zero::ModelElement resident = map.peekResolveProxy(held);
+  return isLive(resident) ? qf::zero::elementCast<ObjectStorage>(resident) : ObjectStorage();
 }
 
-// Calls visit(uuid, storage) for every present entry, in ascending UUID order.
+// The entry the map holds for `uuid` when it is present. A dangling, unresolved or
+// destroyed entry counts as absent. A proxy's key is unknown until its storage arrives,
+// so the map files it under the nil UUID; it is found there once it resolves.
+inline ObjectStorage presentEntry(const StorageMap& map, const qf::zero::Uuid& uuid) {
+  const auto& items = map.container();
+  if (const auto it = items.find(uuid); it != items.end()) {
+    if (ObjectStorage storage = residentOf(map, it->second)) return storage;
+  }
+  if (uuid.is_nil()) return {};
+  if (const auto it = items.find(qf::zero::Uuid()); it != items.end() && it->second.isProxy()) {
+    ObjectStorage storage = residentOf(map, it->second);
+    if (storage && storage.getElementUUID() == uuid) return storage;
+  }
+  return {};
+}
+
+// Calls visit(uuid, storage) for every present entry, in map order, with the UUID of the
+// element the storage holds.
 template <class Visit>
 void forEachPresent(const StorageMap& map, Visit&& visit) {
-  for (const auto& [uuid, held] : map.container()) {
+  for (const auto& [key, held] : map.container()) {
     if (held.isLive()) {
-      visit(uuid, held);
-    } else if (const ObjectStorage resolved = presentEntry(map, uuid)) {
-      visit(uuid, resolved);
+      visit(key, held);
+    } else if (const ObjectStorage resident = residentOf(map, held)) {
+      visit(resident.getElementUUID().value_or(key), resident);
     }
   }
 }
