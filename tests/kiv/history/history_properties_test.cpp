@@ -64,74 +64,66 @@ class RandomHistory {
   std::vector<Json> states_;
 };
 
-constexpr unsigned kSeeds[] = {7, 1234, 99991};
+// Each property runs on the history grown from each seed; the seed is the test's name.
+class HistoryProperties : public ::testing::TestWithParam<unsigned> {
+ protected:
+  void SetUp() override { history.grow(30, 4); }
+  RandomHistory history{GetParam()};
+};
 
-TEST(HistoryProperties, ApplyingADiffToTheStateAtItsBaseGivesTheStateAtItsTarget) {
-  for (const unsigned seed : kSeeds) {
-    SCOPED_TRACE("seed " + std::to_string(seed));
-    RandomHistory history(seed);
-    history.grow(30, 4);
-    for (int sample = 0; sample < 60; ++sample) {
-      const std::size_t a = history.pickAny();
-      const std::size_t b = history.pickAny();
-      if (a == b) continue;
-      SCOPED_TRACE("diff of commit " + std::to_string(a) + " against commit " + std::to_string(b));
-      const Model user = history.modelAt(b);
-      ASSERT_NO_THROW(apply(history.commit(a)->diff(history.commit(b)), user));
-      ASSERT_EQ(stateOf(user), history.state(a));
-    }
+TEST_P(HistoryProperties, ApplyingADiffToTheStateAtItsBaseGivesTheStateAtItsTarget) {
+  for (int sample = 0; sample < 60; ++sample) {
+    const std::size_t a = history.pickAny();
+    const std::size_t b = history.pickAny();
+    if (a == b) continue;
+    SCOPED_TRACE("diff of commit " + std::to_string(a) + " against commit " + std::to_string(b));
+    const Model user = history.modelAt(b);
+    ASSERT_NO_THROW(apply(history.commit(a)->diff(history.commit(b)), user));
+    ASSERT_EQ(stateOf(user), history.state(a));
   }
 }
 
-TEST(HistoryProperties, ASnapshotAppliedToAnEmptyModelGivesTheStateAtItsCommit) {
-  for (const unsigned seed : kSeeds) {
-    SCOPED_TRACE("seed " + std::to_string(seed));
-    RandomHistory history(seed);
-    history.grow(30, 4);
-    for (std::size_t i = 0; i < history.size(); ++i) {
-      SCOPED_TRACE("commit " + std::to_string(i));
-      const kiv::Delta snapshot = history.commit(i)->getSnapshot();
-      EXPECT_TRUE(snapshot.getIsSnapshot());
-      const Model user = Model::create();
-      apply(snapshot, user);
-      ASSERT_EQ(stateOf(user), history.state(i));
-    }
+TEST_P(HistoryProperties, ASnapshotAppliedToAnEmptyModelGivesTheStateAtItsCommit) {
+  for (std::size_t i = 0; i < history.size(); ++i) {
+    SCOPED_TRACE("commit " + std::to_string(i));
+    const kiv::Delta snapshot = history.commit(i)->getSnapshot();
+    EXPECT_TRUE(snapshot.getIsSnapshot());
+    const Model user = Model::create();
+    apply(snapshot, user);
+    ASSERT_EQ(stateOf(user), history.state(i));
   }
 }
 
 // Undo steps the user model back to each first parent's state; redoing everything
 // returns the branch (tip and empty redo stack) and the model to where they were.
-TEST(HistoryProperties, UndoThenRedoReturnsABranchAndItsModelToWhereTheyWere) {
-  for (const unsigned seed : kSeeds) {
-    SCOPED_TRACE("seed " + std::to_string(seed));
-    RandomHistory history(seed);
-    history.grow(25, 3);
-    const std::size_t tipIndex = history.size() - 1;
-    std::vector<kiv::Commit> line;  // first-parent line, tip first
-    for (kiv::Commit c = history.commit(tipIndex); c; c = c->getParent()) line.push_back(c);
-    const kiv::Branch branch = kiv::Branch::create(history.repository());
-    for (auto it = line.rbegin(); it != line.rend(); ++it) branch->commit(*it);
+TEST_P(HistoryProperties, UndoThenRedoReturnsABranchAndItsModelToWhereTheyWere) {
+  const std::size_t tipIndex = history.size() - 1;
+  std::vector<kiv::Commit> line;  // first-parent line, tip first
+  for (kiv::Commit c = history.commit(tipIndex); c; c = c->getParent()) line.push_back(c);
+  const kiv::Branch branch = kiv::Branch::create(history.repository());
+  for (auto it = line.rbegin(); it != line.rend(); ++it) branch->commit(*it);
 
-    const Model user = history.modelAt(tipIndex);
-    std::size_t undone = 0;
-    while (branch->canUndo()) {
-      apply(branch->undo(), user);
-      ++undone;
-      if (const kiv::Commit tip = branch.getTip()) {
-        ASSERT_EQ(stateOf(user), history.state(history.indexOf(tip)));
-      } else {
-        ASSERT_TRUE(stateOf(user).empty());
-      }
+  const Model user = history.modelAt(tipIndex);
+  std::size_t undone = 0;
+  while (branch->canUndo()) {
+    apply(branch->undo(), user);
+    ++undone;
+    if (const kiv::Commit tip = branch.getTip()) {
+      ASSERT_EQ(stateOf(user), history.state(history.indexOf(tip)));
+    } else {
+      ASSERT_TRUE(stateOf(user).empty());
     }
-    // Undo stops at a commit that recorded nothing (every edit of it was refused).
-    const auto firstEmpty = std::find_if(line.begin(), line.end(), [](const kiv::Commit& c) { return c->isEmpty(); });
-    EXPECT_EQ(undone, static_cast<std::size_t>(firstEmpty - line.begin()));
-    EXPECT_FALSE(branch->isEmpty()) << "undone commits stay on the redo stack";
-    while (branch->canRedo()) apply(branch->redo(), user);
-    EXPECT_EQ(branch.getTip(), line.front());
-    EXPECT_EQ(branch.getRedoStack().size(), 0u);
-    EXPECT_EQ(stateOf(user), history.state(tipIndex));
   }
+  // Undo stops at a commit that recorded nothing (every edit of it was refused).
+  const auto firstEmpty = std::find_if(line.begin(), line.end(), [](const kiv::Commit& c) { return c->isEmpty(); });
+  EXPECT_EQ(undone, static_cast<std::size_t>(firstEmpty - line.begin()));
+  EXPECT_FALSE(branch->isEmpty()) << "undone commits stay on the redo stack";
+  while (branch->canRedo()) apply(branch->redo(), user);
+  EXPECT_EQ(branch.getTip(), line.front());
+  EXPECT_EQ(branch.getRedoStack().size(), 0u);
+  EXPECT_EQ(stateOf(user), history.state(tipIndex));
 }
+
+INSTANTIATE_TEST_SUITE_P(Seeds, HistoryProperties, ::testing::Values(7u, 1234u, 99991u));
 
 }  // namespace
