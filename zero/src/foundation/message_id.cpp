@@ -6,7 +6,7 @@
 #include <utility>
 #include <variant>
 
-#include "qf/zero/core/text.h"
+#include "foundation/core/text/utf.h"
 
 namespace foundation::core::except {
 
@@ -29,7 +29,7 @@ std::string argumentText(const MessageArgument& argument) {
             if constexpr (std::is_same_v<T, std::string>)
                 return value;
             else if constexpr (std::is_same_v<T, std::u16string>)
-                return qf::zero::toUtf8(value);
+                return foundation::core::text::toUtf8(value);
             else
                 return std::to_string(value);
         },

@@ -1,15 +1,12 @@
 #pragma once
 
-#include <string>
-#include <string_view>
+#include "foundation/core/text/utf.h"
 
 namespace qf::zero {
 
-// Conversions between UTF-8 and UTF-16. Both are total: malformed input (a lone surrogate, a
-// byte that cannot start or continue a sequence, an overlong or out-of-range encoding, a
-// truncated sequence) becomes U+FFFD, one per maximal ill-formed subsequence, and the
-// conversion carries on with the next code unit. Well-formed input round-trips exactly.
-std::string toUtf8(std::u16string_view text);
-std::u16string toUtf16(std::string_view text);
+// The framework's names for the UTF-8 / UTF-16 conversions of foundation (see there for how
+// malformed input is treated); they live below core so that message rendering can use them.
+using foundation::core::text::toUtf16;
+using foundation::core::text::toUtf8;
 
 }  // namespace qf::zero

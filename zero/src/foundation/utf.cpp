@@ -1,9 +1,9 @@
-#include "qf/zero/core/text.h"
+#include "foundation/core/text/utf.h"
 
 #include <cstddef>
 #include <cstdint>
 
-namespace qf::zero {
+namespace foundation::core::text {
 
 namespace {
 
@@ -112,4 +112,4 @@ std::u16string toUtf16(std::string_view text) {
     return out;
 }
 
-}  // namespace qf::zero
+}  // namespace foundation::core::text
