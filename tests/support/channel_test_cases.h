@@ -142,7 +142,8 @@ TEST_P(ChannelContract, DeliversInOrderOnItsOwnThreadWhatWasSentBeforeAndAfterSt
     const auto threads = inbox->deliveringThreads();
     EXPECT_NE(threads.front(), std::this_thread::get_id());
     EXPECT_THAT(threads, testing::Each(threads.front()));
-    EXPECT_THROW(pair.b->start([](std::string) {}, [](const std::string&) {}), std::logic_error);
+    EXPECT_THROW(pair.b->start([](std::string) {}, [](const std::string&) {}),
+                 Raised<qf0::messages::ChannelAlreadyStarted>);
 }
 
 TEST_P(ChannelContract, ClosingOneEndClosesBothExactlyOnceAndRefusesFurtherSends) {

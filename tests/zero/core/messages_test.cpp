@@ -68,6 +68,8 @@ TEST(Qf0Messages, EveryKeyHasATextAndAClassWhoseArgumentsFillItsPlaceholders) {
         messageRow<msg::UnknownPacketType>("Gossip"),
         messageRow<msg::ConnectionFailed>("127.0.0.1:9", "connection refused"),
         messageRow<msg::ListenFailed>("127.0.0.1:80", "address in use"),
+        messageRow<msg::CannotCreateTransportWithoutChannel>(),
+        messageRow<msg::ChannelAlreadyStarted>(),
     };
     EXPECT_EQ(msg::catalog().name(), "qf0:messages");
     support::checkCatalog(msg::catalog(), rows);

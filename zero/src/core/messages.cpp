@@ -48,6 +48,8 @@ constexpr CatalogEntry entries[] = {
     {"UnknownPacketType", "No handler accepts packets of type '{1}'."},
     {"ConnectionFailed", "Cannot connect to {1}: {2}."},
     {"ListenFailed", "Cannot listen on {1}: {2}."},
+    {"CannotCreateTransportWithoutChannel", "Cannot create a packet transport without a channel."},
+    {"ChannelAlreadyStarted", "The channel has already been started; a channel is started only once."},
 };
 
 constexpr Catalog messagesCatalog{"qf0:messages", entries};

@@ -1,6 +1,5 @@
 #include "io/channel_state.h"
 
-#include <stdexcept>
 #include <utility>
 
 #include "qf/zero/core/messages.h"
@@ -33,7 +32,7 @@ void ChannelState::start(SynchronizationChannel::MessageHandler onMessage,
                          SynchronizationChannel::ClosedHandler onClosed) {
     std::lock_guard lock(mutex_);
     if (started_)
-        throw std::logic_error("SynchronizationChannel::start called a second time");
+        reportException(qf0::messages::ChannelAlreadyStarted());
     onMessage_ = std::move(onMessage);
     onClosed_ = std::move(onClosed);
     started_ = true;

@@ -31,7 +31,7 @@ public:
     // Raises ChannelClosed with the reason when closed, PacketTooLarge when size is over the limit.
     void checkCanSend(std::size_t size) const;
 
-    // Stores the handlers. Raises std::logic_error when called twice.
+    // Stores the handlers. Raises ChannelAlreadyStarted when called twice.
     void start(SynchronizationChannel::MessageHandler onMessage, SynchronizationChannel::ClosedHandler onClosed);
 
     bool started() const;

@@ -7,7 +7,6 @@
 #include <exception>
 #include <mutex>
 #include <optional>
-#include <stdexcept>
 #include <thread>
 #include <unordered_map>
 #include <utility>
@@ -51,7 +50,7 @@ class PacketTransport::Impl : public std::enable_shared_from_this<Impl> {
 public:
     explicit Impl(std::shared_ptr<SynchronizationChannel> channel) : channel_(std::move(channel)) {
         if (!channel_)
-            throw std::invalid_argument("a PacketTransport needs a channel");
+            reportException(qf0::messages::CannotCreateTransportWithoutChannel());
     }
 
     // Callbacks hold the transport weakly: the channel may outlive it.

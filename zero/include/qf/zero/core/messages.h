@@ -63,5 +63,7 @@ FOUNDATION_MESSAGE(catalog, PacketTooLarge, std::int64_t, std::int64_t)  // size
 FOUNDATION_MESSAGE(catalog, UnknownPacketType, std::string)             // packet type
 FOUNDATION_MESSAGE(catalog, ConnectionFailed, std::string, std::string)  // endpoint, why
 FOUNDATION_MESSAGE(catalog, ListenFailed, std::string, std::string)      // endpoint, why
+FOUNDATION_MESSAGE(catalog, CannotCreateTransportWithoutChannel)
+FOUNDATION_MESSAGE(catalog, ChannelAlreadyStarted)
 
 }  // namespace qf0::messages

@@ -47,7 +47,7 @@ public:
 
     static constexpr const char* errorPacketType = "Error";
 
-    // Starts the channel. Raises std::invalid_argument for a null channel.
+    // Starts the channel. Raises CannotCreateTransportWithoutChannel for a null channel.
     // REQUIRES: channel not started.
     explicit PacketTransport(std::shared_ptr<SynchronizationChannel> channel);
 

@@ -33,7 +33,7 @@ public:
     // either side closes or the connection fails; the reason says which, for people to read. When
     // the channel had already closed and its thread ended, onClosed runs at once on the calling
     // thread. Nothing is delivered to anyone before start().
-    // REQUIRES: called once; both handlers callable. A second call raises std::logic_error.
+    // REQUIRES: called once; both handlers callable. A second call raises ChannelAlreadyStarted.
     virtual void start(MessageHandler onMessage, ClosedHandler onClosed) = 0;
 
     // Queues one message for the peer and returns without waiting for it to leave. Raises
