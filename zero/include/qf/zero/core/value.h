@@ -5,6 +5,22 @@
 //   int n = v.getValue<int>();            // 42
 //   v.getValue<std::u16string>();         // raises "CannotCastIncompatibleTypes"
 //
+// A many-valued property reads as a live view of its collection, valid while the element
+// lives; changes through it are checked and recorded like setters:
+//
+//   auto* books = shelf.getPropertyValue(booksProperty).getValue<ReferenceCollection*>();
+//   books->add(book);
+//   auto* tags = book.getPropertyValue(tagsProperty).getValue<PrimitiveCollection*>();
+//   tags->genericAdd(Value::of(std::u16string(u"desert")));
+//   // getValue<AbstractOwnedCollection*>() reads either kind; size() and genericAt(i) walk it.
+//
+// A run-time enumeration's value is its literal element; a generated enumeration's is
+// its C++ enum:
+//
+//   book.setPropertyValue(genre, Value::createElementValue(fictionLiteral));
+//   elementCast<meta::EnumLiteral>(book.getPropertyValue(genre).getElement()).getName();
+//   generatedBook.getPropertyValue(genreProperty).getValue<Genre>();   // Genre::Fiction
+//
 // Values are immutable once made and cheap to copy (the payload is shared).
 #pragma once
 
@@ -62,6 +78,8 @@ class Value {
 
   template <class T>
   static Value of(T value, ValueMeta meta = {});
+  // An element: a reference's target or a run-time enumeration's literal. A null
+  // handle gives an empty value (an unset optional reference).
   static Value createElementValue(const ModelElement& element, const meta::Property& property = {});
   template <class T>
   static Value createPrimitiveValue(const meta::Property& property, T value) {
@@ -98,6 +116,8 @@ class Value {
   }
   // Reads the value as T. Element handles convert to any handle type the element
   // is an instance of; an empty value reads as a null handle or an empty optional.
+  // A pointer to a collection class (ReferenceCollection*, PrimitiveCollection*,
+  // AbstractOwnedCollection*) reads a collection view; the value does not own it.
   template <class T>
   T getValue() const;
 
