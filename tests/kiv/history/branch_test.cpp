@@ -1,23 +1,12 @@
 // Branches: committing, undo and redo, mirroring, cloning, merging through a strategy,
 // and equivalence of branches and branch maps.
+#include "history_fixture.h"
 #include "kiv/merge/merge_strategy.h"
-#include "kiv/messages/messages.h"
 #include "kiv/metamodel/branch_impl.h"
-#include "kiv/metamodel/commit_impl.h"
-#include "kiv/metamodel/delta_impl.h"
-#include "kiv/metamodel/object_storage_impl.h"
-#include "qf/zero/core/messages.h"
-#include "qf/zero/core/model_impl.h"
-
-#include <gtest/gtest.h>
-
-#include <functional>
-#include <map>
 
 namespace {
 
-using foundation::core::except::Exception;
-using qf::zero::Model;
+using namespace history_test;
 
 // A commit with a one-storage delta, so that it can be undone.
 kiv::Commit commitOn(const Model& model, const kiv::Commit& parent = {}, const qf::zero::Uuid& id = {}) {

@@ -1,46 +1,22 @@
 // Commits: recording user elements, finding their stored states, snapshots, diffs,
 // equality, wiping out, and the refusal of loops in history.
-#include "kiv/messages/messages.h"
-#include "kiv/metamodel/commit_impl.h"
-#include "kiv/metamodel/delta_impl.h"
-#include "kiv/metamodel/object_storage_impl.h"
-#include "qf/zero/core/messages.h"
-
-#include <gtest/gtest.h>
+#include "history_fixture.h"
 
 #include <boost/date_time/posix_time/posix_time.hpp>
 
-#include "history_fixture.h"
-
 namespace {
 
-using foundation::core::except::Exception;
 using namespace history_test;
 
-class Commits : public ::testing::Test {
- protected:
-  ModelElement node(const std::u16string& name) {
-    ModelElement element = tm.node.instantiate(user);
-    tm.setName(element, name);
-    return element;
-  }
-  void rename(ModelElement& element, const std::u16string& name) {
-    qf::zero::Transaction transaction = user->beginTransaction();
-    tm.setName(element, name);
-    transaction.commit();
-  }
-  static std::u16string nameIn(const kiv::ObjectStorage& storage) {
-    return qf::zero::toUtf16(storage.getContent().at("content").at("name").get<std::string>());
-  }
+using Commits = HistoryTest;
 
-  support::TestMetamodel tm;
-  Model repository = Model::create();
-  Model user = Model::create();
-};
+std::u16string nameIn(const kiv::ObjectStorage& storage) {
+  return qf::zero::toUtf16(storage.getContent().at("content").at("name").get<std::string>());
+}
 
 TEST_F(Commits, RecordingStoresEachStateOnceAndSharesThePreviousOne) {
   ModelElement x;
-  const kiv::Commit first = record(repository, user, {}, [&] { x = node(u"x"); });
+  const kiv::Commit first = record(repository, user, {}, [&] { x = nodeNamed(u"x"); });
   ASSERT_TRUE(first.getDelta());
   const kiv::ObjectStorage created = first.getDelta()->getCurrent(x.getUuid());
   EXPECT_TRUE(first.getDelta()->isCreated(x.getUuid()));
@@ -60,7 +36,7 @@ TEST_F(Commits, RecordingStoresEachStateOnceAndSharesThePreviousOne) {
 
 TEST_F(Commits, UpdatingAnElementWithoutStoredStateIsRefusedAndChangesNothing) {
   const kiv::Commit commit = kiv::Commit::create(repository);
-  ModelElement stranger = node(u"s");
+  ModelElement stranger = nodeNamed(u"s");
   const std::size_t elements = repository->getElementCount();
   try {
     commit->addUpdated(stranger);
@@ -76,7 +52,7 @@ TEST_F(Commits, UpdatingAnElementWithoutStoredStateIsRefusedAndChangesNothing) {
 
 TEST_F(Commits, FindFollowsFirstParentsAndStopsAtASnapshot) {
   ModelElement x;
-  const kiv::Commit root = record(repository, user, {}, [&] { x = node(u"root"); });
+  const kiv::Commit root = record(repository, user, {}, [&] { x = nodeNamed(u"root"); });
   const kiv::Commit ours = record(repository, user, {root}, [&] { tm.setName(x, u"ours"); });
   const kiv::Commit theirs = record(repository, user, {root}, [&] { tm.setName(x, u"theirs"); });
   const kiv::Commit merge = kiv::Commit::create(repository);
@@ -92,7 +68,7 @@ TEST_F(Commits, FindFollowsFirstParentsAndStopsAtASnapshot) {
 
 TEST_F(Commits, ASnapshotOfACommitWithoutDeltaLeavesOnlyItself) {
   ModelElement x;
-  const kiv::Commit root = record(repository, user, {}, [&] { x = node(u"x"); });
+  const kiv::Commit root = record(repository, user, {}, [&] { x = nodeNamed(u"x"); });
   const kiv::Commit empty = kiv::Commit::create(repository);
   empty->addParent(root);
   const std::size_t elements = repository->getElementCount();
@@ -104,7 +80,7 @@ TEST_F(Commits, ASnapshotOfACommitWithoutDeltaLeavesOnlyItself) {
 }
 
 TEST_F(Commits, DiffAgainstItselfHasNothingToCompose) {
-  const kiv::Commit root = record(repository, user, {}, [&] { node(u"x"); });
+  const kiv::Commit root = record(repository, user, {}, [&] { nodeNamed(u"x"); });
   const std::size_t elements = repository->getElementCount();
   EXPECT_THROW(root->diff(root), Exception<kiv::messages::CannotComposeZeroDeltas>);
   EXPECT_EQ(repository->getElementCount(), elements);
@@ -117,7 +93,7 @@ TEST_F(Commits, DiffBetweenUnrelatedHistoriesGoesThroughNothing) {
   ModelElement x;
   ModelElement y;
   const Model otherUser = Model::create();
-  const kiv::Commit mine = record(repository, user, {}, [&] { x = node(u"x"); });
+  const kiv::Commit mine = record(repository, user, {}, [&] { x = nodeNamed(u"x"); });
   const kiv::Commit theirRoot = record(repository, otherUser, {}, [&] {
     y = tm.node.instantiate(otherUser);
   });
@@ -135,7 +111,7 @@ TEST_F(Commits, DiffBetweenUnrelatedHistoriesGoesThroughNothing) {
 
 TEST_F(Commits, DiffAlongAPathLeavesOutTheBasesOwnDelta) {
   ModelElement x;
-  const kiv::Commit root = record(repository, user, {}, [&] { x = node(u"a"); });
+  const kiv::Commit root = record(repository, user, {}, [&] { x = nodeNamed(u"a"); });
   const kiv::Commit middle = record(repository, user, {root}, [&] { tm.setName(x, u"b"); });
   const kiv::Commit tip = record(repository, user, {middle}, [&] { tm.setName(x, u"c"); });
   const kiv::Delta delta = tip->diff(root);
@@ -148,7 +124,6 @@ TEST_F(Commits, DiffAlongAPathLeavesOutTheBasesOwnDelta) {
 }
 
 TEST_F(Commits, EqualCommitsAreTheSameRecordedCommit) {
-  const Model elsewhere = Model::create();
   const auto when = boost::posix_time::time_from_string("2026-11-21 10:00:00");
   const auto commitIn = [&](const Model& model, const qf::zero::Uuid& id, const qf::zero::Uuid& deltaId) {
     return kiv::Commit::Builder(model)
@@ -172,7 +147,7 @@ TEST_F(Commits, EqualCommitsAreTheSameRecordedCommit) {
 
 TEST_F(Commits, WipeOutDestroysTheCommitItsDeltaAndItsStoragesEvenShared) {
   ModelElement x;
-  const kiv::Commit root = record(repository, user, {}, [&] { x = node(u"x"); });
+  const kiv::Commit root = record(repository, user, {}, [&] { x = nodeNamed(u"x"); });
   const kiv::Commit next = record(repository, user, {root}, [&] { tm.setName(x, u"y"); });
   const kiv::ObjectStorage shared = root.getDelta()->getCurrent(x.getUuid());
   const kiv::Delta delta = root.getDelta();

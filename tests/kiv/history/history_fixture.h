@@ -1,4 +1,5 @@
-// Histories of a small user model recorded as commits, for the history tests.
+// Set-up shared by the history tests: the models a test works in, storages and deltas
+// built by hand, and histories of a small user model recorded as commits.
 //
 // A user transaction becomes one commit the way the library's commit producer makes
 // them: created and modified elements are stored anew, a destroyed element's last state
@@ -6,29 +7,91 @@
 #pragma once
 
 #include "kiv/history/element_reuse_model_builder.h"
+#include "kiv/messages/messages.h"
 #include "kiv/metamodel/commit_impl.h"
 #include "kiv/metamodel/delta_impl.h"
 #include "kiv/metamodel/object_storage_impl.h"
 #include "qf/zero/core/change_report.h"
 #include "qf/zero/core/listener.h"
+#include "qf/zero/core/messages.h"
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/io/json_change_report_synchronizer.h"
 #include "qf/zero/io/json_parser.h"
 #include "support/json_documents.h"
 #include "support/test_metamodel.h"
 
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
 #include <nlohmann/json.hpp>
 
 #include <functional>
+#include <map>
 #include <memory>
+#include <ostream>
 #include <string>
 #include <vector>
 
+// Failures show a storage by its state.
+namespace kiv {
+inline void PrintTo(const ObjectStorage& storage, std::ostream* out) {
+  if (!storage) {
+    *out << "no storage";
+  } else if (!storage.isLive()) {
+    *out << (storage.isProxy() ? "proxy " : "destroyed storage ") << storage.identifier();
+  } else {
+    *out << "storage " << storage.getContent().dump();
+  }
+}
+}  // namespace kiv
+
 namespace history_test {
 
+using foundation::core::except::Exception;
+using qf::zero::JsonValue;
 using qf::zero::Model;
 using qf::zero::ModelElement;
-using Json = nlohmann::ordered_json;
+using qf::zero::Uuid;
+using StorageMap = std::map<Uuid, kiv::ObjectStorage>;
+
+// A storage of `element` whose content is just a label for its state.
+inline kiv::ObjectStorage storageOf(const Model& model, const Uuid& element, const std::string& state) {
+  return kiv::ObjectStorage::Builder(model).doSetElementUUID(element).doSetContent(JsonValue{{"state", state}}).create();
+}
+
+inline StorageMap previousOf(const kiv::Delta& delta) { return delta.getPrevious().container(); }
+inline StorageMap currentOf(const kiv::Delta& delta) { return delta.getCurrent().container(); }
+
+// Names the rows of a table after their `name` member.
+struct CaseName {
+  template <class Case>
+  std::string operator()(const ::testing::TestParamInfo<Case>& info) const {
+    return info.param.name;
+  }
+};
+
+// A repository, a user model of the test metamodel, a second repository for copies,
+// and three element UUIDs. Members are public so that table rows can reach them.
+struct HistoryModels {
+  ModelElement nodeNamed(const std::u16string& name) { return named(tm.node, name); }
+  ModelElement gadgetNamed(const std::u16string& name) { return named(tm.gadget, name); }
+  ModelElement named(const qf::zero::meta::Class& type, const std::u16string& name) {
+    ModelElement element = type.instantiate(user);
+    tm.setName(element, name);
+    return element;
+  }
+  kiv::ObjectStorage stored(const Uuid& element, const std::string& state) {
+    return storageOf(repository, element, state);
+  }
+
+  support::TestMetamodel tm;
+  Model repository = Model::create();
+  Model user = Model::create();
+  Model elsewhere = Model::create();
+  const Uuid a = qf::zero::generateNewUuid(), b = qf::zero::generateNewUuid(), c = qf::zero::generateNewUuid();
+};
+
+class HistoryTest : public ::testing::Test, public HistoryModels {};
 
 // Turns the next committed transaction of a user model into a commit with the given
 // parents, in the repository model.
@@ -74,11 +137,11 @@ inline kiv::Commit record(const Model& repository, const Model& user, std::vecto
 
 // The state of a model as its entries by id: equal for equal models whatever the
 // order in which elements were made.
-inline std::map<std::string, Json> stateOf(const Model& model) {
+inline std::map<std::string, JsonValue> stateOf(const Model& model) {
   return support::entriesById(support::serializeModel(model));
 }
 
-inline Model modelFromDocument(const Json& document) {
+inline Model modelFromDocument(const JsonValue& document) {
   Model model = Model::create();
   qf::zero::io::JSONParser().parseVerbatim(document, model);
   return model;

@@ -1,12 +1,8 @@
 // Properties of recorded histories: seeded random edits of a small user model, recorded
 // as commits on branching lines with hand-built merge commits.
-#include "kiv/metamodel/branch_impl.h"
-#include "kiv/metamodel/commit_impl.h"
-#include "kiv/metamodel/delta_impl.h"
-#include "support/random_editor.h"
 #include "history_fixture.h"
-
-#include <gtest/gtest.h>
+#include "kiv/metamodel/branch_impl.h"
+#include "support/random_editor.h"
 
 #include <random>
 
@@ -45,7 +41,7 @@ class RandomHistory {
     return static_cast<std::size_t>(std::find(commits_.begin(), commits_.end(), commit) - commits_.begin());
   }
   const kiv::Commit& commit(std::size_t i) const { return commits_[i]; }
-  std::map<std::string, Json> state(std::size_t i) const { return support::entriesById(states_[i]); }
+  std::map<std::string, JsonValue> state(std::size_t i) const { return support::entriesById(states_[i]); }
   Model modelAt(std::size_t i) const { return modelFromDocument(states_[i]); }
   std::size_t pickAny() { return std::uniform_int_distribution<std::size_t>(0, commits_.size() - 1)(random_); }
   const Model& repository() const { return repository_; }
@@ -61,10 +57,10 @@ class RandomHistory {
   Model repository_ = Model::create();
   std::mt19937 random_;
   std::vector<kiv::Commit> commits_;
-  std::vector<Json> states_;
+  std::vector<JsonValue> states_;
 };
 
-// Each property runs on the history grown from each seed; the seed is the test's name.
+// Each property runs on the history grown from each seed; the seed names the test.
 class HistoryProperties : public ::testing::TestWithParam<unsigned> {
  protected:
   void SetUp() override { history.grow(30, 4); }
@@ -124,6 +120,7 @@ TEST_P(HistoryProperties, UndoThenRedoReturnsABranchAndItsModelToWhereTheyWere) 
   EXPECT_EQ(stateOf(user), history.state(tipIndex));
 }
 
-INSTANTIATE_TEST_SUITE_P(Seeds, HistoryProperties, ::testing::Values(7u, 1234u, 99991u));
+INSTANTIATE_TEST_SUITE_P(Seeds, HistoryProperties, ::testing::Values(7u, 1234u, 99991u),
+                         ::testing::PrintToStringParamName());
 
 }  // namespace
