@@ -4,6 +4,7 @@
 #include "qf/zero/core/meta/property_serializer.h"
 #include "qf/zero/core/text.h"
 
+#include <nlohmann/json.hpp>
 #include <boost/date_time/posix_time/posix_time.hpp>
 
 #include <algorithm>

@@ -35,6 +35,7 @@ def outputs(d):
     for c in d.classes:
         out += [(inc + files.handle_header_of(d, c), lambda c=c: emit_class.handle_header(d, c)),
                 (inc + files.impl_header_of(d, c), lambda c=c: emit_class.impl_header(d, c)),
+                (inc + files.storage_header_of(d, c), lambda c=c: emit_class.storage_header(d, c)),
                 (src + files.source(c, "_access"), lambda c=c: emit_class.access_source(d, c)),
                 (src + files.source(c, "_reflection"), lambda c=c: emit_reflection.reflection_source(d, c))]
     return out

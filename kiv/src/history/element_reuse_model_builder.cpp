@@ -1,6 +1,6 @@
 #include "kiv/history/element_reuse_model_builder.h"
 
-#include "qf/zero/core/element_impl.h"
+#include "qf/zero/core/internal/element_impl.h"
 #include "qf/zero/core/meta/property.h"
 #include "qf/zero/core/owned_collection.h"
 #include "qf/zero/core/value.h"

@@ -3,7 +3,7 @@
 #pragma once
 
 #include "kiv/metamodel/object_storage_impl.h"
-#include "qf/zero/core/element_impl.h"
+#include "qf/zero/core/internal/element_impl.h"
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/reference_collection.h"

@@ -3,6 +3,8 @@
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/report_exception.h"
 
+#include <nlohmann/json.hpp>
+
 namespace kiv::protocol {
 
 ::kiv::protocol::History History::Impl::parseHistory(const qf::zero::JsonValue& /*historyJson*/, const qf::zero::Model& /*model*/, const std::vector<std::u16string>& /*properties*/, const qf::zero::Model& /*otherModel*/) {

@@ -3,6 +3,8 @@
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/report_exception.h"
 
+#include <nlohmann/json.hpp>
+
 namespace kiv {
 
 bool Repository::Impl::isEmpty() const {

@@ -1,7 +1,7 @@
 // What the serializer writes: the document layout, the choices of its customizer,
 // and values whose form a registered serializer decides.
 #include "qf/zero/core/meta/framework_package.h"
-#include "qf/zero/core/meta/property_serializer.h"
+#include "qf/zero/core/meta/builtin_property_serializers.h"
 #include "qf/zero/io/json_constants.h"
 #include "qf/zero/io/json_parser.h"
 #include "qf/zero/io/json_serializer.h"

@@ -4,6 +4,7 @@ Errors name the offending item ("class Branch, property tip: unknown type 'Comit
 and stop the generator before it writes anything."""
 
 import json
+import os
 import uuid
 
 KINDS = {"optional": 0, "single": 1, "sequence": 2, "set": 4, "map": 6}
@@ -34,6 +35,16 @@ def _check_keys(where, data, allowed):
     unknown = sorted(set(data) - set(allowed))
     if unknown:
         _fail(where, f"unknown field(s) {', '.join(unknown)}")
+
+
+def _doc(where, data):
+    """A documentation text: one string, or a list of lines (JSON has no multi-line strings)."""
+    doc = data.get("doc", "")
+    if isinstance(doc, list) and all(isinstance(line, str) for line in doc):
+        return "\n".join(doc)
+    if not isinstance(doc, str):
+        _fail(where, "doc is a string or a list of strings")
+    return doc
 
 
 def _named(kind, position, item):
@@ -180,7 +191,9 @@ class Operation:
         self.owner = owner
         self.name = data.get("name") or _fail(where, "an operation needs a name")
         where = f"{where}, operation {self.name}"
-        _check_keys(where, data, {"name", "args", "result", "const", "static", "virtual", "abstract", "invoker"})
+        _check_keys(where, data, {"name", "args", "result", "const", "static", "virtual", "abstract", "invoker",
+                                  "doc"})
+        self.doc = _doc(where, data)
         self.args = [Argument(a, f"{where}, argument {i + 1}", resolve) for i, a in enumerate(data.get("args", []))]
         self.result = TypeRef(data["result"], f"{where}, result", resolve) if data.get("result") else None
         self.is_const = data.get("const", False)
@@ -208,7 +221,8 @@ class Property:
         where = f"{where}, property {self.name}"
         _check_keys(where, data, {"name", "index", "kind", "type", "composite", "ordered", "unique", "readOnly",
                                   "setOnce", "transient", "publicAccessor", "publicMutator", "default", "opposite",
-                                  "key"})
+                                  "key", "doc"})
+        self.doc = _doc(where, data)
         self.where = where
         self.index = data.get("index")
         self.kind = data.get("kind", "single")
@@ -282,8 +296,9 @@ class Class(StructuredType):
 
     def __init__(self, data, package, where):
         _check_keys(where, data, {"name", "package", "super", "abstract", "properties", "operations", "overrides",
-                                  "declarations"})
+                                  "declarations", "doc"})
         super().__init__(data, package, where)
+        self.doc = _doc(where, data)
         self.super_name = data.get("super", "ModelElement")
         self.superclass = None
         self.is_abstract = data.get("abstract", False)
@@ -493,4 +508,5 @@ def load(path):
             data = json.load(f)
         except json.JSONDecodeError as e:
             raise DescriptionError(f"{path}: not JSON: {e}") from None
-    return Description(data, path)
+    # The file name only: generated files must not depend on where the tree lies.
+    return Description(data, os.path.basename(path))

@@ -24,6 +24,15 @@ def _referenced_classes(cls):
     return refs
 
 
+def json_include(cls):
+    """The whole of nlohmann's header, for a source whose class passes JSON values by value."""
+    types = [p.type for p in cls.properties]
+    for op in cls.operations + cls.overrides:
+        types += [a.type.type for a in op.args] + ([op.result.type] if op.result else [])
+    return ["#include <nlohmann/json.hpp>"] if any(t is not None and t.cpp == "qf::zero::JsonValue"
+                                                   for t in types) else []
+
+
 def referenced_impl_includes(d, cls):
     return [f'#include "{files.impl_header_of(d, t)}"' for t in _referenced_classes(cls)]
 
@@ -31,7 +40,8 @@ def referenced_impl_includes(d, cls):
 def _type_includes(d, cls, for_impl):
     """Headers for the types a class's members or operations name."""
     includes = set()
-    types = [p.type for p in cls.properties]
+    member_types = [p.type for p in cls.properties]
+    types = list(member_types)
     for op in cls.operations:
         types += [a.type.type for a in op.args if a.type.type] + ([op.result.type] if op.result and op.result.type else [])
     for t in types:
@@ -40,12 +50,21 @@ def _type_includes(d, cls, for_impl):
         if t.kind == "enum" or (for_impl and t.kind == "datatype"):
             includes.add(f'"{files.header(d, t)}"')
         if for_impl and t.cpp == "qf::zero::JsonValue":
-            includes.add("<nlohmann/json.hpp>")
+            # A member needs the whole type; a declaration of an operation does not.
+            includes.add("<nlohmann/json.hpp>" if t in member_types else "<nlohmann/json_fwd.hpp>")
         if for_impl and t.cpp == "qf::zero::DateTime":
             includes.add("<boost/date_time/posix_time/ptime.hpp>")
         if t.cpp == "qf::zero::Model":
             includes.add('"qf/zero/core/model.h"')
     return includes
+
+
+def doc_comment(doc, indent=""):
+    """The description's documentation of an item as comment lines, one per line written."""
+    if not doc:
+        return []
+    # A documented member stands apart from the one before it.
+    return [""] * bool(indent) + [f"{indent}//{' ' + line if line else ''}" for line in doc.split("\n")]
 
 
 def _operation_decl(op, in_handle):
@@ -93,7 +112,8 @@ def handle_header(d, cls):
               "#include <unordered_set>", "#include <vector>"]
     standard = ["<map>", "<memory>", "<string>", "<unordered_set>", "<vector>"]
     lines += [f"#include {i}" for i in includes if i.startswith("<") and i not in standard]
-    lines += ["", ns_open(ns), "", f"class {cls.name} : public {handle_base(cls)} {{",
+    lines += ["", ns_open(ns), ""] + doc_comment(cls.doc)
+    lines += [f"class {cls.name} : public {handle_base(cls)} {{",
               f"  QF_ZERO_HANDLE({cls.name}, {handle_base(cls)})", "  class Builder;", "  class Constrainables;", ""]
     if not cls.is_abstract:
         lines.append(f"  static {cls.name} create(const {QZ}::Model& model, const {QZ}::Uuid& id = {{}});")
@@ -102,10 +122,12 @@ def handle_header(d, cls):
     if readable:
         lines.append("")
     for p in readable:
+        lines += doc_comment(p.doc, "  ")
         lines.append(f"  {getter_return(p, True)} get{p.cap}() const;")
     if cls.operations:
         lines.append("")
     for op in cls.operations:
+        lines += doc_comment(op.doc, "  ")
         lines.append(f"  {_operation_decl(op, True)}")
     base_constrainables = f"{handle_base(cls)}::Constrainables"
     lines += ["};", "",
@@ -119,7 +141,7 @@ def handle_header(d, cls):
               f"  std::vector<{cls.name}> getTypedInstances() const;", "};", "", ns_close(ns), "",
               "template <>",
               f"struct std::hash<{cls.cpp}> : std::hash<{QZ}::ModelElement> {{}};", ""]
-    return "\n".join(lines)
+    return "\n".join(line for i, line in enumerate(lines) if line or i == 0 or lines[i - 1])
 
 
 # ---- the implementation ---------------------------------------------------------------------
@@ -128,18 +150,21 @@ def handle_header(d, cls):
 def impl_header(d, cls):
     ns = cls.package.namespace
     base_include = (f'"{files.impl_header_of(d, cls.superclass)}"' if cls.superclass
-                    else '"qf/zero/core/element_impl.h"')
+                    else '"qf/zero/core/internal/element_impl.h"')
     includes = sorted(_type_includes(d, cls, True))
-    lines = [files.banner(d) + f"// {cls.name}::Impl: the state of a \"{cls.qualified_name}\" element, its old-value",
-             "// storage and its builders. The operations are implemented by hand.", "#pragma once", "",
+    if "<nlohmann/json.hpp>" in includes and "<nlohmann/json_fwd.hpp>" in includes:
+        includes.remove("<nlohmann/json_fwd.hpp>")
+    lines = [files.banner(d) + f"// {cls.name}::Impl: the state of a \"{cls.qualified_name}\" element: typed getters,",
+             "// setters and mutable collections, the operations (implemented by hand), and the builders.",
+             "// The old-value storage of change tracking is internal (internal/..._storage.h).", "#pragma once", "",
              f'#include "{files.handle_header_of(d, cls)}"', f"#include {base_include}"]
     lines += [f'#include "{files.handle_header_of(d, t)}"' for t in _referenced_classes(cls)]
     lines += [f'#include "{files.package_header(d)}"', '#include "qf/zero/core/builder.h"',
-              '#include "qf/zero/core/proxy_id.h"', '#include "qf/zero/core/storage.h"']
+              '#include "qf/zero/core/proxy_id.h"']
     lines += [f"#include {i}" for i in includes if i.startswith('"')]
     lines += [""] + [f"#include {i}" for i in includes if i.startswith("<")]
     lines += ["", ns_open(ns), ""]
-    lines += _impl_class(d, cls) + [""] + _storage_class(cls) + [""] + _builder_base(d, cls)
+    lines += _impl_class(d, cls) + [""] + _builder_base(d, cls)
     if not cls.is_abstract:
         lines += [""] + _builder(cls)
     lines += ["", ns_close(ns), ""]
@@ -162,8 +187,7 @@ def _impl_class(d, cls):
                       f"  // Raises \"CannotModifyProxy\" on a proxy.",
                       f"  {collection_alias(p)}& get{p.cap}Mutable();"]
         else:
-            lines += [f"  {getter_return(p)} get{p.cap}() const;", f"  void set{p.cap}({param(p)} value);",
-                      f"  void basicSet{p.cap}({param(p)} value);"]
+            lines += [f"  {getter_return(p)} get{p.cap}() const;", f"  void set{p.cap}({param(p)} value);"]
     if cls.operations or cls.overrides:
         lines += ["", "  // Operations."]
     for op in cls.operations:
@@ -174,17 +198,23 @@ def _impl_class(d, cls):
     if cls.declarations:
         lines += [""] + [f"  {decl}" for decl in cls.declarations]
     root = cls.superclass is None
-    lines += ["", "  // Reflection and change tracking.",
-              f"  {QZ}::Value basicGetValue(const {QZ}::meta::Property& property) const override;",
-              f"  void basicSetValue(const {QZ}::meta::Property& property, const {QZ}::Value& value) override;",
-              f"  {QZ}::AbstractOwnedCollection* basicGetCollection(const {QZ}::meta::Property& property) const override;",
+    lines += ["", "  // The property with index `index` (inherited ones included); null when there is none.",
               f"  {QZ}::meta::Property getPropertyByIndex(int index) const override;",
-              f"  std::unique_ptr<{QZ}::ModelElement::Impl::Storage> createStorage() const override;",
-              f"  void copyValue({QZ}::ModelElement::Impl::Storage* storage, int index) const override;",
-              f"  void restoreFromStorage({QZ}::ModelElement::Impl::Storage* storage, bool collections) override;",
               "  // Drops the outgoing references this element holds without owning them.",
               f"  {'virtual ' if root else ''}void convertReferencesToProxies(bool keepProxyIds, "
               f"boost::optional<{QZ}::ProxyId>& proxyId){' override' if not root else ''};"]
+    raw = [p for p in cls.properties if not p.many]
+    lines += ["", " protected:",
+              "  // Reflection and change tracking, for the framework: reached through the element base.",
+              f"  {QZ}::Value basicGetValue(const {QZ}::meta::Property& property) const override;",
+              f"  void basicSetValue(const {QZ}::meta::Property& property, const {QZ}::Value& value) override;",
+              f"  {QZ}::AbstractOwnedCollection* basicGetCollection(const {QZ}::meta::Property& property) const override;",
+              f"  std::unique_ptr<{QZ}::ModelElement::Impl::Storage> createStorage() const override;",
+              f"  void copyValue({QZ}::ModelElement::Impl::Storage* storage, int index) const override;",
+              f"  void restoreFromStorage({QZ}::ModelElement::Impl::Storage* storage, bool collections) override;"]
+    if raw:
+        lines += ["  // Raw stores for reflection and rollback: no checks, no change tracking, no opposite."]
+        lines += [f"  void basicSet{p.cap}({param(p)} value);" for p in raw]
     if cls.properties:
         lines += ["", " private:"]
         for p in cls.properties:
@@ -195,6 +225,16 @@ def _impl_class(d, cls):
                 lines.append(f"  {member_type(p)} {member(p)}{{{init}}};")
     lines.append("};")
     return lines
+
+
+def storage_header(d, cls):
+    base_include = (f'"{files.storage_header_of(d, cls.superclass)}"' if cls.superclass
+                    else '"qf/zero/core/internal/storage.h"')
+    ns = cls.package.namespace
+    lines = [files.banner(d) + f"// {cls.name}::Impl::Storage: internal to the generated code; users never include it.",
+             "#pragma once", "", f'#include "{files.impl_header_of(d, cls)}"', f"#include {base_include}", "",
+             ns_open(ns), ""] + _storage_class(cls) + ["", ns_close(ns), ""]
+    return "\n".join(lines)
 
 
 def _single(cls):
@@ -276,7 +316,8 @@ def access_source(d, cls):
     n = cls.name
     pkg = _pkg(d)
     lines = [files.banner(d) + f'#include "{files.impl_header_of(d, cls)}"', "",
-             *referenced_impl_includes(d, cls), '#include "qf/zero/core/model_impl.h"', "", ns_open(ns), ""]
+             *referenced_impl_includes(d, cls), '#include "qf/zero/core/model_impl.h"', *json_include(cls), "",
+             ns_open(ns), ""]
     lines += [f"{QZ}::meta::Class {n}::metaClass() {{ return {pkg}.{package_getter(cls)}(); }}", ""]
     if not cls.is_abstract:
         lines += [f"{n} {n}::create(const {QZ}::Model& model, const {QZ}::Uuid& id) {{",

@@ -79,7 +79,7 @@ def source(d):
              *[f'#include "{files.header(d, e)}"' for e in d.enums],
              *[f'#include "{files.header(d, t)}"' for t in d.datatypes],
              '#include "qf/zero/core/messages.h"', '#include "qf/zero/core/meta/meta_registry.h"',
-             '#include "qf/zero/core/meta/opaque_value_traits.h"', '#include "qf/zero/core/meta/property_serializer.h"',
+             '#include "qf/zero/core/meta/builtin_property_serializers.h"', '#include "qf/zero/core/meta/opaque_value_traits.h"',
              '#include "qf/zero/core/primitive_collection.h"', '#include "qf/zero/core/report_exception.h"', "",
              ns_open(d.namespace), "", f"using {META}::ValueFlags;", "",
              "// Never destroyed: elements may outlive every other static object, and their",
@@ -254,7 +254,8 @@ def invokers_source(d):
     n = d.meta_class
     lines = [files.banner(d) + f'#include "{files.package_header(d)}"', "",
              *[f'#include "{files.impl_header_of(d, c)}"' for c in d.classes],
-             '#include "qf/zero/core/meta/invoker_support.h"', "", ns_open(d.namespace), "",
+             '#include "qf/zero/core/meta/invoker_support.h"', "", "#include <nlohmann/json.hpp>", "",
+             ns_open(d.namespace), "",
              f"namespace invoker = {META}::invoker;", "",
              f"void {n}::installInvokers() {{"]
     for cls in d.classes:

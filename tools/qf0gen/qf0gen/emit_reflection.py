@@ -2,7 +2,7 @@
 old-value slots."""
 
 from . import files
-from .emit_class import referenced_impl_includes
+from .emit_class import json_include, referenced_impl_includes
 from .cpp import impl_base, member, member_type, ns_close, ns_open, package_getter
 
 QZ = "qf::zero"
@@ -46,8 +46,10 @@ def reflection_source(d, cls):
     many = [p for p in cls.properties if p.many]
     base = impl_base(cls)
     storage_base = f"{cls.superclass.cpp}::Impl::Storage" if cls.superclass else f"{QZ}::ModelElement::Impl::Storage"
-    lines = [files.banner(d) + f'#include "{files.impl_header_of(d, cls)}"', "",
-             *referenced_impl_includes(d, cls), '#include "qf/zero/core/messages.h"', '#include "qf/zero/core/model_impl.h"', '#include "qf/zero/core/report_exception.h"', "", ns_open(ns), "",
+    lines = [files.banner(d) + f'#include "{files.storage_header_of(d, cls)}"', "",
+             *referenced_impl_includes(d, cls), '#include "qf/zero/core/messages.h"',
+             '#include "qf/zero/core/model_impl.h"', '#include "qf/zero/core/report_exception.h"', *json_include(cls),
+             "", ns_open(ns), "",
              "using qf::zero::reportException;", ""]
     lines += [f"{QZ}::Value {n}::Impl::basicGetValue(const {QZ}::meta::Property& property) const {{"]
     lines += _dispatch(d, cls, single, lambda p: [f"return {_wrap(p, member(p))};"],

@@ -36,3 +36,9 @@ def handle_header_of(description, cls):
 
 def impl_header_of(description, cls):
     return header(description, cls, "_impl")
+
+
+def storage_header_of(description, cls):
+    """The old-value storage of a class: internal to the generated code, never included by users."""
+    folder = folder_of(cls)
+    return f"{description.include_dir}/internal/{folder + '/' if folder else ''}{snake(cls.name)}_storage.h"

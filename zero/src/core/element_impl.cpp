@@ -1,4 +1,4 @@
-#include "qf/zero/core/element_impl.h"
+#include "qf/zero/core/internal/element_impl.h"
 
 #include "core/transaction_state.h"
 #include "qf/zero/core/messages.h"
@@ -11,7 +11,7 @@
 #include "qf/zero/core/primitive_collection.h"
 #include "qf/zero/core/reference_collection.h"
 #include "qf/zero/core/report_exception.h"
-#include "qf/zero/core/storage.h"
+#include "qf/zero/core/internal/storage.h"
 
 #include <algorithm>
 

@@ -4,7 +4,7 @@
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/meta/structured_type.h"
 #include "qf/zero/core/report_exception.h"
-#include "qf/zero/core/storage.h"
+#include "qf/zero/core/internal/storage.h"
 
 #include <algorithm>
 #include <exception>

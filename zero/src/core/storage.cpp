@@ -1,4 +1,4 @@
-#include "qf/zero/core/storage.h"
+#include "qf/zero/core/internal/storage.h"
 
 #include "qf/zero/core/owned_collection.h"
 

@@ -2,7 +2,7 @@
 // savepoint level created or destroyed it and the old-value storage of each level.
 #pragma once
 
-#include "qf/zero/core/storage.h"
+#include "qf/zero/core/internal/storage.h"
 #include "qf/zero/core/value.h"
 
 #include <boost/optional.hpp>

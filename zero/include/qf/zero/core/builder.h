@@ -8,7 +8,7 @@
 // is made first, values are set second, all in one transaction.
 #pragma once
 
-#include "qf/zero/core/element_impl.h"
+#include "qf/zero/core/internal/element_impl.h"
 #include "qf/zero/core/meta/structured_type.h"
 #include "qf/zero/core/model.h"
 #include "qf/zero/core/value.h"

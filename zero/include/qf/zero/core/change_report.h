@@ -5,7 +5,7 @@
 // back is not a change, and an element whose every change came back is not modified.
 #pragma once
 
-#include "qf/zero/core/element_impl.h"
+#include "qf/zero/core/internal/element_impl.h"
 #include "qf/zero/core/model.h"
 #include "qf/zero/core/model_element.h"
 #include "qf/zero/core/value.h"

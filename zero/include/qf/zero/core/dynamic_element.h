@@ -2,7 +2,7 @@
 // reflectively, one slot per property index.
 #pragma once
 
-#include "qf/zero/core/element_impl.h"
+#include "qf/zero/core/internal/element_impl.h"
 #include "qf/zero/core/meta/structured_type.h"
 #include "qf/zero/core/owned_collection.h"
 #include "qf/zero/core/value.h"

@@ -4,7 +4,7 @@
 // owned by the model; destroyed ones stay valid as long as handles refer to them.
 #pragma once
 
-#include "qf/zero/core/element_impl.h"
+#include "qf/zero/core/internal/element_impl.h"
 #include "qf/zero/core/listener.h"
 #include "qf/zero/core/model.h"
 #include "qf/zero/core/query.h"

@@ -24,7 +24,7 @@
 // Values are immutable once made and cheap to copy (the payload is shared).
 #pragma once
 
-#include "qf/zero/core/element_impl.h"
+#include "qf/zero/core/internal/element_impl.h"
 #include "qf/zero/core/meta/property.h"
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/model_element.h"

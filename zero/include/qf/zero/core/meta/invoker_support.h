@@ -7,7 +7,7 @@
 //   }
 #pragma once
 
-#include "qf/zero/core/element_impl.h"
+#include "qf/zero/core/internal/element_impl.h"
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/meta/structured_type.h"
 #include "qf/zero/core/report_exception.h"

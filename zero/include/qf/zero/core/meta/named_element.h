@@ -7,7 +7,7 @@
 // rather than reflective properties.
 #pragma once
 
-#include "qf/zero/core/element_impl.h"
+#include "qf/zero/core/internal/element_impl.h"
 #include "qf/zero/core/model_element.h"
 
 #include <string>

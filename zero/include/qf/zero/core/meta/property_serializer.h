@@ -1,19 +1,16 @@
 // Property and datatype serializers: how values of a type are written to JSON and
 // read back, for the types whose form the JSON serializer cannot know by itself
-// (generated enumerations, datatypes, opaque pointer values).
-//
-//   registry.registerPropertySerializer(colourEnum, std::make_unique<DefaultPropertySerializer<Colour>>(colourEnum));
-//   registry.registerPropertySerializer(handleType, std::make_unique<TransientOnlyPropertySerializer<Handle>>());
+// (generated enumerations, datatypes, opaque pointer values). The ready-made ones are in
+// builtin_property_serializers.h; this header needs only nlohmann's forward declarations.
 //
 // Like the metamodel registry, the serializer registry is filled while metamodels
 // are set up and read from any thread afterwards.
 #pragma once
 
-#include "qf/zero/core/meta/enum.h"
 #include "qf/zero/core/meta/structured_type.h"
 #include "qf/zero/core/value.h"
 
-#include <nlohmann/json.hpp>
+#include <nlohmann/json_fwd.hpp>
 
 #include <map>
 #include <memory>
@@ -45,37 +42,6 @@ class DatatypeSerializer {
   // Both raise "NoSuchProperty" for a property the datatype does not have.
   virtual Value getPropertyValue(const Value& datum, const Property& property) const = 0;
   virtual Value setPropertyValue(const Value& datum, const Property& property, const Value& value) const = 0;
-};
-
-// Writes a C++ enumeration E as the name of its literal in `metaEnum`.
-template <class E>
-class DefaultPropertySerializer final : public PropertySerializer {
- public:
-  explicit DefaultPropertySerializer(Enum metaEnum) : enum_(std::move(metaEnum)) {}
-
-  nlohmann::ordered_json toJson(const Value& value) const override {
-    const EnumLiteral literal = enum_->findLiteral(static_cast<int>(value.getValue<E>()));
-    if (!literal) reportException(qf0::messages::InvalidValue());
-    return toUtf8(literal.getName());
-  }
-  Value fromJson(const nlohmann::ordered_json& json, const Property& property) const override {
-    if (!json.is_string()) reportException(qf0::messages::InvalidValue());
-    const EnumLiteral literal = enum_->findLiteral(toUtf16(json.get_ref<const std::string&>()));
-    if (!literal) reportException(qf0::messages::InvalidValue());
-    return Value::createPrimitiveValue(property, static_cast<E>(literal.getValue()));
-  }
-
- private:
-  Enum enum_;
-};
-
-// For values that live only in memory (handles to threads, sockets, callbacks).
-template <class T>
-class TransientOnlyPropertySerializer final : public PropertySerializer {
- public:
-  bool isSerializable() const noexcept override { return false; }
-  nlohmann::ordered_json toJson(const Value&) const override { return nullptr; }
-  Value fromJson(const nlohmann::ordered_json&, const Property&) const override { return Value(); }
 };
 
 class PropertySerializerRegistry {

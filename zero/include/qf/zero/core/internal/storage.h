@@ -13,7 +13,7 @@
 // whose old value a derived storage keeps.
 #pragma once
 
-#include "qf/zero/core/element_impl.h"
+#include "qf/zero/core/internal/element_impl.h"
 #include "qf/zero/core/meta/structured_type.h"
 #include "qf/zero/core/value.h"
 
