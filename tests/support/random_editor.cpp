@@ -21,7 +21,10 @@ void RandomEditor::step() {
 }
 
 void RandomEditor::checkInvariants() const {
-  for (const ModelElement& e : live()) {
+  const std::vector<ModelElement> all = live();
+  ASSERT_EQ(model_->getElementCount(), all.size());
+  for (const ModelElement& e : all) {
+    ASSERT_EQ(model_->findElement(e.getUuid()), e) << e.identifier() << " is not found by its UUID";
     const ModelElement parent = e.getPropertyValue(tm_.parent).getElement();
     ASSERT_EQ(parent, e.container());
     if (parent) {
@@ -47,6 +50,12 @@ void RandomEditor::checkInvariants() const {
   }
 }
 
+Uuid RandomEditor::reusedUuid() {
+  if (!reuseDestroyedUuids_ || destroyed_.empty() || pick(2) == 0) return {};
+  const Uuid id = destroyed_[static_cast<std::size_t>(pick(static_cast<int>(destroyed_.size())))];
+  return model_->findElement(id) ? Uuid() : id;
+}
+
 std::vector<ModelElement> RandomEditor::live() const {
   return model_->getInstances(tm_.node, query::SearchClassMatchMode::IncludeSubclasses);
 }
@@ -62,7 +71,8 @@ void RandomEditor::edit() {
   ModelElement a = any(), b = any();
   if (!a || pick(8) == 0) {
     const int which = pick(4);
-    ModelElement created = (which == 0 ? tm_.leaf : which == 1 ? tm_.gadget : tm_.node).instantiate(model_);
+    ModelElement created =
+        (which == 0 ? tm_.leaf : which == 1 ? tm_.gadget : tm_.node).instantiate(model_, reusedUuid());
     if (a && pick(2) == 0) tm_.refs(a, tm_.children)->add(created);
     return;
   }
@@ -85,7 +95,13 @@ void RandomEditor::edit() {
     case 9: a.setPropertyValue(tm_.best, Value::createElementValue(b)); break;
     case 10: tm_.refs(a, tm_.index)->add(b); break;
     case 11: a.setPropertyValue(tm_.born, Value::of(DateTime(boost::gregorian::date(2020, 1, 1 + pick(5))))); break;
-    case 12: if (pick(3) == 0) a.destroy(); break;
+    case 12:
+      if (pick(3) == 0) {
+        const Uuid id = a.getUuid();
+        a.destroy();
+        if (reuseDestroyedUuids_) destroyed_.push_back(id);
+      }
+      break;
   }
 }
 

@@ -70,6 +70,62 @@ TEST(Transaction, CancelRestoresCreatedChangedAndDestroyedElements) {
   EXPECT_TRUE(dune->incomingReferences().empty());
 }
 
+// Where a transaction destroys an element and then makes a new one with its UUID: the
+// cancel of the whole must bring back the old element, found by its UUID, and nothing else.
+enum class Reuse {
+  SameLevel,                      // both in the outermost transaction, which is cancelled
+  RecreatedInSavepoint,           // destroyed outside, re-created in a committed savepoint
+  DestroyedInCommittedSavepoint,  // destroyed in a committed savepoint, re-created outside
+  BothInCancelledSavepoint        // both in a savepoint, and only the savepoint is cancelled
+};
+
+class DestroyThenRecreate : public ::testing::TestWithParam<Reuse> {};
+
+TEST_P(DestroyThenRecreate, CancelBringsBackTheOldElementUnderItsUuid) {
+  Library l;
+  Model model = Model::create();
+  ModelElement shelf = l.shelf.instantiate(model);
+  ModelElement dune = l.book.instantiate(model);
+  books(l, shelf)->add(dune);
+  dune.setPropertyValue(l.title, Value::of(std::u16string(u"Dune")));
+  const Uuid id = dune.getUuid();
+  const Reuse reuse = GetParam();
+  const auto recreate = [&] {
+    ModelElement again = l.book.instantiate(model, id);
+    books(l, shelf)->add(again);
+    ASSERT_EQ(model->findElement(id), again);
+  };
+  {
+    Transaction outer = model->beginTransaction();
+    {
+      Transaction inner = model->beginTransaction();
+      dune.destroy();
+      if (reuse == Reuse::SameLevel || reuse == Reuse::RecreatedInSavepoint) inner.commit();
+      if (reuse == Reuse::DestroyedInCommittedSavepoint) {
+        inner.commit();
+        recreate();
+      } else if (reuse == Reuse::RecreatedInSavepoint) {
+        Transaction another = model->beginTransaction();
+        recreate();
+        another.commit();
+      } else {
+        recreate();
+      }
+    }
+    if (reuse == Reuse::BothInCancelledSavepoint) outer.commit();
+  }
+  EXPECT_EQ(model->getElementCount(), 2u);
+  EXPECT_EQ(model->findElement(id), dune);
+  EXPECT_TRUE(dune.isLive());
+  EXPECT_EQ(books(l, shelf)->getAllValues(), std::vector<ModelElement>{dune});
+  EXPECT_EQ(titleOf(l, dune), u"Dune");
+}
+
+INSTANTIATE_TEST_SUITE_P(Levels, DestroyThenRecreate,
+                         ::testing::Values(Reuse::SameLevel, Reuse::RecreatedInSavepoint,
+                                           Reuse::DestroyedInCommittedSavepoint,
+                                           Reuse::BothInCancelledSavepoint));
+
 TEST(Transaction, InnerSavepointCancelKeepsOuterChanges) {
   Library l;
   Model model = Model::create();

@@ -94,7 +94,9 @@ std::vector<ModelElement> ModelImpl::getInstances(const meta::Class& metaClass,
 
 void ModelImpl::registerElement(ModelElement::Impl* element) {
   proxies_.erase(element->uuid_);
-  elements_.emplace(element->uuid_, IntrusivePtr<ModelElement::Impl>(element));
+  // An element a cancel brings back takes its UUID over from one created since with the
+  // same UUID, which the same cancel removes.
+  elements_.insert_or_assign(element->uuid_, IntrusivePtr<ModelElement::Impl>(element));
   instances_[element->getMetaClass().getImpl()].emplace(element->serial_, element);
   updateTopLevel(element);
 }
@@ -104,7 +106,11 @@ void ModelImpl::unregisterElement(ModelElement::Impl* element) noexcept {
   if (auto it = instances_.find(element->getMetaClass().getImpl()); it != instances_.end()) {
     it->second.erase(element->serial_);
   }
-  elements_.erase(element->uuid_);  // may drop the last reference: keep it last
+  // Only its own entry: the UUID may already name an element a cancel brought back.
+  // Erasing may drop the last reference: keep it last.
+  if (auto it = elements_.find(element->uuid_); it != elements_.end() && it->second.get() == element) {
+    elements_.erase(it);
+  }
 }
 
 void ModelImpl::updateTopLevel(ModelElement::Impl* element) noexcept {
