@@ -150,9 +150,9 @@ const LinearHistory& linearHistory(std::size_t length) {
 
 void setCommitCounters(benchmark::State& state, std::size_t commitsWalked) {
   state.counters["commits"] = static_cast<double>(commitsWalked);
-  state.counters["per_commit"] = benchmark::Counter(static_cast<double>(commitsWalked),
-                                                    benchmark::Counter::kIsIterationInvariantRate |
-                                                        benchmark::Counter::kInvert);
+  state.counters["per_commit"] =
+      benchmark::Counter(static_cast<double>(commitsWalked),
+                         benchmark::Counter::kIsIterationInvariantRate | benchmark::Counter::kInvert);
 }
 
 // getSnapshot and diff make their result as a new delta in the repository model. Each
@@ -213,7 +213,9 @@ void historyLengths(benchmark::internal::Benchmark* benchmark) {
 BENCHMARK(snapshotOfTip)->Apply(historyLengths)->Unit(benchmark::kMicrosecond);
 BENCHMARK(diffOfTipAgainstNear)->Apply(historyLengths)->Unit(benchmark::kMicrosecond);
 BENCHMARK(diffOfTipAgainstInitial)->Apply(historyLengths)->Unit(benchmark::kMicrosecond);
-BENCHMARK_CAPTURE(findFromTip, last_recorded_in_initial, true)->Apply(historyLengths)->Unit(benchmark::kMicrosecond);
+BENCHMARK_CAPTURE(findFromTip, last_recorded_in_initial, true)
+    ->Apply(historyLengths)
+    ->Unit(benchmark::kMicrosecond);
 BENCHMARK_CAPTURE(findFromTip, recorded_by_tip, false)->Apply(historyLengths)->Unit(benchmark::kNanosecond);
 
 // A line of `merges` merges from an initial commit: before each merge the line gains
@@ -285,6 +287,9 @@ void outsiderIsNotPredecessorOfMergeLineTip(benchmark::State& state) {
   state.counters["paths"] = static_cast<double>(std::size_t{1} << state.range(0));
 }
 
-BENCHMARK(outsiderIsNotPredecessorOfMergeLineTip)->DenseRange(4, 20, 4)->ArgName("merges")->Unit(benchmark::kMicrosecond);
+BENCHMARK(outsiderIsNotPredecessorOfMergeLineTip)
+    ->DenseRange(4, 20, 4)
+    ->ArgName("merges")
+    ->Unit(benchmark::kMicrosecond);
 
 }  // namespace

@@ -3,12 +3,13 @@
 // of the JSON library. Argument: the number of elements.
 #include "qf/zero/core/meta/meta_registry.h"
 #include "qf/zero/core/model_impl.h"
-#include "qf/zero/core/reference_collection.h"
 #include "qf/zero/core/primitive_collection.h"
+#include "qf/zero/core/reference_collection.h"
 #include "qf/zero/io/json_parser.h"
 #include "qf/zero/io/json_serializer.h"
 
 #include <benchmark/benchmark.h>
+
 #include <nlohmann/json.hpp>
 
 #include <map>
@@ -31,7 +32,8 @@ struct Parts {
   Parts() {
     auto& registry = meta::MetaRegistry::getInstance();
     part->setSuperclass(ModelElement::metaClass());
-    auto add = [&](const char16_t* n, meta::ValueFlags flags, bool composite, const meta::Type& type, int index) {
+    auto add = [&](const char16_t* n, meta::ValueFlags flags, bool composite, const meta::Type& type,
+                   int index) {
       meta::Property p = meta::Property::create(metaModel, {}, n, flags, composite);
       p->setType(type);
       p->setPropertyIndex(index);
@@ -58,13 +60,16 @@ struct Parts {
     Transaction t = model->beginTransaction();
     for (std::size_t i = 0; i < n; ++i) {
       ModelElement e = part.instantiate(model);
-      e.setPropertyValue(name, Value::of(u"part-" + std::u16string(std::to_string(i).begin(), std::to_string(i).end())));
+      e.setPropertyValue(
+          name, Value::of(u"part-" + std::u16string(std::to_string(i).begin(), std::to_string(i).end())));
       e.setPropertyValue(count, Value::of(static_cast<int>(i)));
       auto* tagSet = e.getPropertyValue(tags).getValue<PrimitiveCollection*>();
       tagSet->genericAdd(Value::of(std::u16string(u"tag") + char16_t(u'a' + i % 7)));
       tagSet->genericAdd(Value::of(std::u16string(u"common")));
       if (i > 0) all[(i - 1) / 8].getPropertyValue(children).getValue<ReferenceCollection*>()->add(e);
-      if (i > 1) e.setPropertyValue(link, Value::createElementValue(all[std::uniform_int_distribution<std::size_t>(0, i - 1)(random)]));
+      if (i > 1)
+        e.setPropertyValue(link, Value::createElementValue(
+                                     all[std::uniform_int_distribution<std::size_t>(0, i - 1)(random)]));
       all.push_back(e);
     }
     t.commit();

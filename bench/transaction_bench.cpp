@@ -43,7 +43,8 @@ void commitOfKChangesInModelOfN(benchmark::State& state) {
   const auto batch = state.range(2) == 0 ? n : static_cast<std::size_t>(state.range(2));
   for (std::size_t first = 0; first < n; first += batch) {
     Transaction t = model->beginTransaction();
-    for (std::size_t i = first; i < std::min(n, first + batch); ++i) items.push_back(counter.item.instantiate(model));
+    for (std::size_t i = first; i < std::min(n, first + batch); ++i)
+      items.push_back(counter.item.instantiate(model));
     t.commit();
   }
   ReportCounter listener;
@@ -52,13 +53,14 @@ void commitOfKChangesInModelOfN(benchmark::State& state) {
   for (auto _ : state) {
     ++round;
     Transaction t = model->beginTransaction();
-    for (std::size_t i = 0; i < k; ++i) items[(i * 7919 + static_cast<std::size_t>(round)) % n].setPropertyValue(counter.count, Value::of(round));
+    for (std::size_t i = 0; i < k; ++i)
+      items[(i * 7919 + static_cast<std::size_t>(round)) % n].setPropertyValue(counter.count,
+                                                                               Value::of(round));
     t.commit();
   }
   model->removeListener(&listener);
-  state.counters["per_change_ns"] = benchmark::Counter(static_cast<double>(k),
-                                                       benchmark::Counter::kIsIterationInvariantRate |
-                                                           benchmark::Counter::kInvert);
+  state.counters["per_change_ns"] = benchmark::Counter(
+      static_cast<double>(k), benchmark::Counter::kIsIterationInvariantRate | benchmark::Counter::kInvert);
   benchmark::DoNotOptimize(listener.modified);
 }
 

@@ -132,10 +132,11 @@ int main() {
   printShelf(mm, shelf);
 
   // Book.shelf was set as the opposite of Shelf.books; a containment also makes the container.
-  ModelElement dune = shelf.getPropertyValue(mm.books).getValue<ReferenceCollection*>()->getAllValues().front();
+  ModelElement dune =
+      shelf.getPropertyValue(mm.books).getValue<ReferenceCollection*>()->getAllValues().front();
   const ModelElement dunesShelf = dune.getPropertyValue(mm.bookShelf).getElement();
-  std::cout << "Dune is on " << text(dunesShelf.getPropertyValue(mm.shelfName)) << ", its container: "
-            << std::boolalpha << (dune.container() == shelf) << "\n";
+  std::cout << "Dune is on " << text(dunesShelf.getPropertyValue(mm.shelfName))
+            << ", its container: " << std::boolalpha << (dune.container() == shelf) << "\n";
 
   // Bad input is refused with a message from the catalog; the transaction, left without a
   // commit, rolls back.

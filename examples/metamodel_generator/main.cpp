@@ -12,6 +12,7 @@
 #include "qf/zero/io/json_serializer.h"
 
 #include <boost/date_time/posix_time/posix_time.hpp>
+
 #include <nlohmann/json.hpp>
 
 #include <iostream>
@@ -84,9 +85,10 @@ int main() {
   printShelf("after cancel", library);
 
   const Book dune = library.findByTitle(u"Dune");
-  std::cout << "typed: Dune is " << (dune.isLong() ? "long" : "short") << "; " << library.countOf(Genre::Science)
-            << " science book(s)\n";
-  const Value found = library.invoke(package.getLibrary_findByTitle_operation(), {Value::of(std::u16string(u"Cosmos"))});
+  std::cout << "typed: Dune is " << (dune.isLong() ? "long" : "short") << "; "
+            << library.countOf(Genre::Science) << " science book(s)\n";
+  const Value found =
+      library.invoke(package.getLibrary_findByTitle_operation(), {Value::of(std::u16string(u"Cosmos"))});
   ModelElement cosmos = found.getElement();
   const Value isLong = cosmos.invoke(package.getBook_isLong_operation(), {});
   const Value count = library.invoke(package.getLibrary_countOf_operation(), {Value::of(Genre::Fiction)});
@@ -94,7 +96,8 @@ int main() {
             << count.getValue<int>() << " fiction book(s)\n";
 
   nlohmann::ordered_json document;
-  qf::zero::io::JSONSerializer().serialize(model, qf::zero::io::SerializationOutput::forIntermediateFormat(&document));
+  qf::zero::io::JSONSerializer().serialize(
+      model, qf::zero::io::SerializationOutput::forIntermediateFormat(&document));
   std::cout << "as a document: " << document.dump(2) << "\n";
   return 0;
 }

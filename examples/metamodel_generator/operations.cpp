@@ -16,8 +16,8 @@ Book Library::Impl::findByTitle(const std::u16string& title) const {
 
 int Library::Impl::countOf(Genre genre) const {
   const auto& byTitle = getBooks().container();
-  return static_cast<int>(
-      std::count_if(byTitle.begin(), byTitle.end(), [&](const auto& entry) { return entry.second.getGenre() == genre; }));
+  return static_cast<int>(std::count_if(byTitle.begin(), byTitle.end(),
+                                        [&](const auto& entry) { return entry.second.getGenre() == genre; }));
 }
 
 // Long enough to need a second evening.

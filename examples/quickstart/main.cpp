@@ -102,7 +102,8 @@ int main() {
                                                                 std::make_unique<io::ModelBuilder>());
     return boost::optional<io::JSONPacket>(io::JSONPacket("Applied", titleIn(copy)));
   });
-  const io::JSONPacket reply = sender.sendAndExpectPacket(io::JSONPacket("ChangeReport", printer.lastReport), "Applied");
+  const io::JSONPacket reply =
+      sender.sendAndExpectPacket(io::JSONPacket("ChangeReport", printer.lastReport), "Applied");
   std::cout << "sent as a packet; the peer replied " << reply.getType() << ", title now "
             << reply.getJson().dump() << "\n";
   model->removeListener(&printer);

@@ -3,9 +3,10 @@
 #include "qf/zero/core/meta/framework_package.h"
 
 #include <boost/date_time/gregorian/gregorian.hpp>
-#include <nlohmann/json.hpp>
 
 #include <gtest/gtest.h>
+
+#include <nlohmann/json.hpp>
 
 namespace support {
 
@@ -71,8 +72,10 @@ void RandomEditor::edit() {
   ModelElement a = any(), b = any();
   if (!a || pick(8) == 0) {
     const int which = pick(4);
-    ModelElement created =
-        (which == 0 ? tm_.leaf : which == 1 ? tm_.gadget : tm_.node).instantiate(model_, reusedUuid());
+    ModelElement created = (which == 0   ? tm_.leaf
+                            : which == 1 ? tm_.gadget
+                                         : tm_.node)
+                               .instantiate(model_, reusedUuid());
     if (a && pick(2) == 0) tm_.refs(a, tm_.children)->add(created);
     return;
   }
@@ -81,20 +84,43 @@ void RandomEditor::edit() {
     return;
   }
   switch (pick(13)) {
-    case 0: a.setPropertyValue(tm_.name, Value::of(someName())); break;
-    case 1: a.setPropertyValue(tm_.count, Value::of(pick(3))); break;
-    case 2:
-      a.setPropertyValue(tm_.kind, Value::createElementValue(tm_.kindEnum->getLiterals()[static_cast<std::size_t>(pick(2))]));
+    case 0:
+      a.setPropertyValue(tm_.name, Value::of(someName()));
       break;
-    case 3: tm_.values(a, tm_.tags)->genericAdd(Value::of(someName())); break;
-    case 4: tm_.values(a, tm_.tags)->genericRemove(Value::of(someName())); break;
-    case 5: tm_.refs(a, tm_.children)->insert(static_cast<std::size_t>(pick(3)), b); break;
-    case 6: b.setPropertyValue(tm_.parent, pick(4) == 0 ? Value() : Value::createElementValue(a)); break;
-    case 7: tm_.refs(a, tm_.friends)->add(b); break;
-    case 8: tm_.refs(a, tm_.friends)->remove(b); break;
-    case 9: a.setPropertyValue(tm_.best, Value::createElementValue(b)); break;
-    case 10: tm_.refs(a, tm_.index)->add(b); break;
-    case 11: a.setPropertyValue(tm_.born, Value::of(DateTime(boost::gregorian::date(2020, 1, 1 + pick(5))))); break;
+    case 1:
+      a.setPropertyValue(tm_.count, Value::of(pick(3)));
+      break;
+    case 2:
+      a.setPropertyValue(tm_.kind, Value::createElementValue(
+                                       tm_.kindEnum->getLiterals()[static_cast<std::size_t>(pick(2))]));
+      break;
+    case 3:
+      tm_.values(a, tm_.tags)->genericAdd(Value::of(someName()));
+      break;
+    case 4:
+      tm_.values(a, tm_.tags)->genericRemove(Value::of(someName()));
+      break;
+    case 5:
+      tm_.refs(a, tm_.children)->insert(static_cast<std::size_t>(pick(3)), b);
+      break;
+    case 6:
+      b.setPropertyValue(tm_.parent, pick(4) == 0 ? Value() : Value::createElementValue(a));
+      break;
+    case 7:
+      tm_.refs(a, tm_.friends)->add(b);
+      break;
+    case 8:
+      tm_.refs(a, tm_.friends)->remove(b);
+      break;
+    case 9:
+      a.setPropertyValue(tm_.best, Value::createElementValue(b));
+      break;
+    case 10:
+      tm_.refs(a, tm_.index)->add(b);
+      break;
+    case 11:
+      a.setPropertyValue(tm_.born, Value::of(DateTime(boost::gregorian::date(2020, 1, 1 + pick(5)))));
+      break;
     case 12:
       if (pick(3) == 0) {
         const Uuid id = a.getUuid();
@@ -107,7 +133,9 @@ void RandomEditor::edit() {
 
 void RandomEditor::editGadget(ModelElement& gadget) {
   switch (pick(6)) {
-    case 0: gadget.setPropertyValue(tm_.flag, Value::of(pick(2) == 0)); break;
+    case 0:
+      gadget.setPropertyValue(tm_.flag, Value::of(pick(2) == 0));
+      break;
     case 1: {
       JsonValue note = JsonValue::object();
       note["n"] = pick(4);
@@ -115,10 +143,18 @@ void RandomEditor::editGadget(ModelElement& gadget) {
       gadget.setPropertyValue(tm_.note, Value::of(note));
       break;
     }
-    case 2: tm_.values(gadget, tm_.scores)->genericAdd(Value::of(pick(3))); break;
-    case 3: gadget.setPropertyValue(tm_.spot, pick(3) == 0 ? Value() : Value::of(Point{pick(9), -pick(9)})); break;
-    case 4: gadget.setPropertyValue(tm_.scratch, Value::of(someName())); break;
-    case 5: gadget.setPropertyValue(tm_.weight, Value::of(pick(100))); break;
+    case 2:
+      tm_.values(gadget, tm_.scores)->genericAdd(Value::of(pick(3)));
+      break;
+    case 3:
+      gadget.setPropertyValue(tm_.spot, pick(3) == 0 ? Value() : Value::of(Point{pick(9), -pick(9)}));
+      break;
+    case 4:
+      gadget.setPropertyValue(tm_.scratch, Value::of(someName()));
+      break;
+    case 5:
+      gadget.setPropertyValue(tm_.weight, Value::of(pick(100)));
+      break;
   }
 }
 

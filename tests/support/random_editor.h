@@ -3,9 +3,8 @@
 // part of the game; each must leave the model as it was.
 #pragma once
 
-#include "support/test_metamodel.h"
-
 #include "qf/zero/core/uuid.h"
+#include "support/test_metamodel.h"
 
 #include <random>
 #include <vector>
@@ -17,7 +16,8 @@ class RandomEditor {
   // With `reuseDestroyedUuids`, new elements now and then take the UUID of one destroyed
   // earlier. A change report cannot yet say that one transaction destroyed an element and
   // made another under its UUID, so only editors of rollback tests ask for it.
-  RandomEditor(const TestMetamodel& tm, qf::zero::Model model, unsigned seed, bool reuseDestroyedUuids = false)
+  RandomEditor(const TestMetamodel& tm, qf::zero::Model model, unsigned seed,
+               bool reuseDestroyedUuids = false)
       : tm_(tm), model_(std::move(model)), random_(seed), reuseDestroyedUuids_(reuseDestroyedUuids) {}
 
   // One random edit. A refused edit must change nothing (checked with gtest asserts).

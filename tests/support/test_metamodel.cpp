@@ -4,8 +4,9 @@
 #include "qf/zero/core/meta/property_serializer.h"
 #include "qf/zero/core/text.h"
 
-#include <nlohmann/json.hpp>
 #include <boost/date_time/posix_time/posix_time.hpp>
+
+#include <nlohmann/json.hpp>
 
 #include <algorithm>
 #include <sstream>
@@ -17,8 +18,8 @@ using namespace qf::zero;
 
 namespace {
 
-meta::Property makeProperty(const Model& m, const meta::Class& owner, const char16_t* name, meta::ValueFlags flags,
-                            bool composite, const meta::Type& type, int index) {
+meta::Property makeProperty(const Model& m, const meta::Class& owner, const char16_t* name,
+                            meta::ValueFlags flags, bool composite, const meta::Type& type, int index) {
   meta::Property p = meta::Property::create(m, {}, name, flags, composite);
   p->setType(type);
   p->setPropertyIndex(index);
@@ -39,7 +40,8 @@ std::string text(const Value& v) {
   if (v.holds<DateTime>()) return boost::posix_time::to_iso_extended_string(v.getValue<DateTime>());
   if (v.holds<bool>()) return v.getValue<bool>() ? "true" : "false";
   if (v.holds<JsonValue>()) return v.getValue<JsonValue>().dump();
-  if (v.holds<Point>()) return "(" + std::to_string(v.getValue<Point>().x) + "," + std::to_string(v.getValue<Point>().y) + ")";
+  if (v.holds<Point>())
+    return "(" + std::to_string(v.getValue<Point>().x) + "," + std::to_string(v.getValue<Point>().y) + ")";
   return "?";
 }
 
@@ -81,7 +83,8 @@ class PointSerializer final : public meta::DatatypeSerializer {
     const Point p = datum.getValue<Point>();
     return Value::of(coordinate(p, property));
   }
-  Value setPropertyValue(const Value& datum, const meta::Property& property, const Value& value) const override {
+  Value setPropertyValue(const Value& datum, const meta::Property& property,
+                         const Value& value) const override {
     Point p = datum.getValue<Point>();
     (property == x_ ? p.x : p.y) = value.getValue<int>();
     (void)coordinate(p, property);
@@ -127,7 +130,8 @@ TestMetamodel::TestMetamodel() {
   best = makeProperty(metaModel, node, u"best", F::Optional, false, node, 8);
   index = makeProperty(metaModel, node, u"index", F::Map, false, node, 9);
   index->setQualifiedBy(name);
-  born = makeProperty(metaModel, node, u"born", F::Optional, false, registry.getPrimitiveType(u"DateTime"), 10);
+  born =
+      makeProperty(metaModel, node, u"born", F::Optional, false, registry.getPrimitiveType(u"DateTime"), 10);
   code = makeProperty(metaModel, node, u"code", F::Optional, false, registry.getPrimitiveType(u"UUID"), 11);
   code->setIsReadOnly(true);
   code->setIsSetOnce(true);
@@ -144,9 +148,11 @@ TestMetamodel::TestMetamodel() {
   }
   pointX->setPropertyIndex(1);
   pointY->setPropertyIndex(2);
-  flag = makeProperty(metaModel, gadget, u"flag", F::Single, false, registry.getPrimitiveType(u"Boolean"), 13);
+  flag =
+      makeProperty(metaModel, gadget, u"flag", F::Single, false, registry.getPrimitiveType(u"Boolean"), 13);
   flag->setDefaultValue(u"true");
-  note = makeProperty(metaModel, gadget, u"note", F::Single, false, registry.getPrimitiveType(u"JsonValue"), 14);
+  note =
+      makeProperty(metaModel, gadget, u"note", F::Single, false, registry.getPrimitiveType(u"JsonValue"), 14);
   scores = makeProperty(metaModel, gadget, u"scores", F::Sequence, false, integer, 15);
   scores->setIsUnique(false);
   scores->setIsOrdered(true);

@@ -43,7 +43,8 @@ struct TestMetamodel {
   qf::zero::meta::Enum kindEnum;
   qf::zero::meta::Class node, leaf, gadget;
   qf::zero::meta::DataType point;
-  qf::zero::meta::Property name, count, kind, tags, children, parent, friends, best, index, born, code, weight;
+  qf::zero::meta::Property name, count, kind, tags, children, parent, friends, best, index, born, code,
+      weight;
   qf::zero::meta::Property flag, note, scores, spot, scratch, pointX, pointY;
 
   TestMetamodel();
@@ -51,8 +52,10 @@ struct TestMetamodel {
   TestMetamodel(const TestMetamodel&) = delete;
   TestMetamodel& operator=(const TestMetamodel&) = delete;
 
-  qf::zero::ReferenceCollection* refs(const qf::zero::ModelElement& e, const qf::zero::meta::Property& p) const;
-  qf::zero::PrimitiveCollection* values(const qf::zero::ModelElement& e, const qf::zero::meta::Property& p) const;
+  qf::zero::ReferenceCollection* refs(const qf::zero::ModelElement& e,
+                                      const qf::zero::meta::Property& p) const;
+  qf::zero::PrimitiveCollection* values(const qf::zero::ModelElement& e,
+                                        const qf::zero::meta::Property& p) const;
   void setName(qf::zero::ModelElement& e, const std::u16string& value) const;
 };
 

@@ -1,8 +1,7 @@
-#include "kiv/metamodel/branch_impl.h"
-
 #include "history/history_support.h"
 #include "kiv/merge/merge_strategy.h"
 #include "kiv/messages/messages.h"
+#include "kiv/metamodel/branch_impl.h"
 #include "kiv/metamodel/commit_impl.h"
 #include "kiv/metamodel/delta_impl.h"
 #include "qf/zero/core/text.h"
@@ -93,7 +92,8 @@ Commit Branch::Impl::findCommitByUUID(const Commit& commit) const {
   if (!commit) qf::zero::reportException(qf0::messages::ElementRequired(u"kiv.Branch.findCommitByUUID"));
   const qf::zero::Uuid uuid = history::identityOf(commit);
   const Commit found = isLive() ? qf::zero::elementCast<Commit>(getModelImpl()->findElement(uuid)) : Commit();
-  if (!found) qf::zero::reportException(messages::CannotFindElement(qf::zero::toUtf16(qf::zero::toText(uuid))));
+  if (!found)
+    qf::zero::reportException(messages::CannotFindElement(qf::zero::toUtf16(qf::zero::toText(uuid))));
   return found;
 }
 
@@ -147,7 +147,8 @@ bool Branch::Impl::isEquivalent(const Branch& other, bool byValue) const {
   const Impl& that = *other.getImpl();
   if (!same(getTip(), that.getTip())) return false;
   for (std::size_t i = 0; i < redoStack_.size(); ++i) {
-    if (i >= that.redoStack_.size() || !same(resolvedEntry(redoStack_, i), resolvedEntry(that.redoStack_, i))) {
+    if (i >= that.redoStack_.size() ||
+        !same(resolvedEntry(redoStack_, i), resolvedEntry(that.redoStack_, i))) {
       return false;
     }
   }
@@ -159,7 +160,8 @@ bool Branch::Impl::areBranchMapsEquivalent(const std::map<std::u16string, Branch
   if (first.size() != second.size()) return false;
   for (const auto& [name, branch] : first) {
     const auto counterpart = second.find(name);
-    if (counterpart == second.end() || !history::isLive(branch) || !branch->isEquivalent(counterpart->second, true)) {
+    if (counterpart == second.end() || !history::isLive(branch) ||
+        !branch->isEquivalent(counterpart->second, true)) {
       return false;
     }
   }

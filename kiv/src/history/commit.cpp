@@ -1,8 +1,7 @@
-#include "kiv/metamodel/commit_impl.h"
-
 #include "history/ancestry.h"
 #include "history/history_support.h"
 #include "kiv/messages/messages.h"
+#include "kiv/metamodel/commit_impl.h"
 #include "kiv/metamodel/delta_impl.h"
 #include "kiv/metamodel/object_storage_impl.h"
 
@@ -149,7 +148,8 @@ Delta Commit::Impl::diff(const Commit& other) const {
     // The last commit of the path is `other`, whose delta is part of its own state.
     std::vector<Delta> deltas;
     for (std::size_t i = 0; i + 1 < path.size(); ++i) deltas.push_back(path[i]->getDelta());
-    const bool anyRecorded = std::any_of(deltas.begin(), deltas.end(), [](const Delta& d) { return history::isLive(d); });
+    const bool anyRecorded =
+        std::any_of(deltas.begin(), deltas.end(), [](const Delta& d) { return history::isLive(d); });
     // Commits that recorded nothing compose to nothing.
     result = deltas.empty() || anyRecorded ? Delta::Impl::compose(deltas) : Delta::create(getModel());
   }

@@ -1,8 +1,7 @@
 // The walks over the commit graph: paths, ancestry, selection by depth and range.
-#include "kiv/metamodel/commit_impl.h"
-
 #include "history/ancestry.h"
 #include "history/history_support.h"
+#include "kiv/metamodel/commit_impl.h"
 
 #include <climits>
 #include <deque>
@@ -106,7 +105,8 @@ void Commit::Impl::select(const std::unordered_set<Commit>& commits, std::unorde
 // The commits reachable from `commits` but not from `predecessors`, both sides including
 // the start commits themselves.
 void Commit::Impl::selectInRange(const std::unordered_set<Commit>& predecessors,
-                                 const std::unordered_set<Commit>& commits, std::unordered_set<Commit>& result) {
+                                 const std::unordered_set<Commit>& commits,
+                                 std::unordered_set<Commit>& result) {
   std::unordered_set<Commit> excluded;
   select(predecessors, excluded, -1);
   select(commits, result, -1);

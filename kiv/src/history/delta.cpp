@@ -1,7 +1,6 @@
-#include "kiv/metamodel/delta_impl.h"
-
 #include "history/history_support.h"
 #include "kiv/messages/messages.h"
+#include "kiv/metamodel/delta_impl.h"
 #include "kiv/metamodel/object_storage_impl.h"
 
 namespace kiv {
@@ -11,9 +10,13 @@ using history::presentEntry;
 
 bool Delta::Impl::isEmpty() const { return previous_.size() == 0 && current_.size() == 0; }
 
-ObjectStorage Delta::Impl::getCurrent(const qf::zero::Uuid& uuid) const { return presentEntry(current_, uuid); }
+ObjectStorage Delta::Impl::getCurrent(const qf::zero::Uuid& uuid) const {
+  return presentEntry(current_, uuid);
+}
 
-ObjectStorage Delta::Impl::getPrevious(const qf::zero::Uuid& uuid) const { return presentEntry(previous_, uuid); }
+ObjectStorage Delta::Impl::getPrevious(const qf::zero::Uuid& uuid) const {
+  return presentEntry(previous_, uuid);
+}
 
 bool Delta::Impl::isCreated(const qf::zero::Uuid& uuid) const {
   return !presentEntry(previous_, uuid) && presentEntry(current_, uuid);
@@ -60,7 +63,8 @@ void Delta::Impl::setPrevious(const Delta& other) {
   qf::zero::Transaction transaction = history::beginTransactionOn(*this);
   PreviousCollection& previous = getPreviousMutable();
   previous.clear();
-  forEachPresent(other->current_, [&](const qf::zero::Uuid&, const ObjectStorage& storage) { previous.add(storage); });
+  forEachPresent(other->current_,
+                 [&](const qf::zero::Uuid&, const ObjectStorage& storage) { previous.add(storage); });
   transaction.commit();
 }
 
@@ -73,8 +77,10 @@ Delta Delta::Impl::invert() const {
   target.setIsSnapshot(isSnapshot_);
   PreviousCollection& previous = target.getPreviousMutable();
   CurrentCollection& current = target.getCurrentMutable();
-  forEachPresent(current_, [&](const qf::zero::Uuid&, const ObjectStorage& storage) { previous.add(storage); });
-  forEachPresent(previous_, [&](const qf::zero::Uuid&, const ObjectStorage& storage) { current.add(storage); });
+  forEachPresent(current_,
+                 [&](const qf::zero::Uuid&, const ObjectStorage& storage) { previous.add(storage); });
+  forEachPresent(previous_,
+                 [&](const qf::zero::Uuid&, const ObjectStorage& storage) { current.add(storage); });
   transaction.commit();
   return inverse;
 }

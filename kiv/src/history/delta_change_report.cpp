@@ -1,7 +1,6 @@
 // Delta::toChangeReport: a delta as the framework's JSON change report.
-#include "kiv/metamodel/delta_impl.h"
-
 #include "history/history_support.h"
+#include "kiv/metamodel/delta_impl.h"
 #include "kiv/metamodel/object_storage_impl.h"
 #include "qf/zero/core/meta/meta_registry.h"
 #include "qf/zero/core/meta/property.h"
@@ -84,7 +83,8 @@ JsonValue Delta::Impl::toChangeReport() const {
     deleted.push_back(storage);
   });
   JsonValue destroyed = JsonValue::array();
-  for (const ObjectStorage& storage : deleted) destroyed.push_back(destroyedEntry(storage.getContent(), destroyedIds));
+  for (const ObjectStorage& storage : deleted)
+    destroyed.push_back(destroyedEntry(storage.getContent(), destroyedIds));
 
   JsonValue report = JsonValue::object();
   report[JSONConstants::ADDED_ATTR] = std::move(added);

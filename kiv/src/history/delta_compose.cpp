@@ -1,8 +1,7 @@
 // Delta::compose: one delta for a sequence of deltas, most recent first.
-#include "kiv/metamodel/delta_impl.h"
-
 #include "history/history_support.h"
 #include "kiv/messages/messages.h"
+#include "kiv/metamodel/delta_impl.h"
 
 #include <boost/functional/hash.hpp>
 
@@ -53,7 +52,8 @@ class Lifecycles {
 // the first live delta; a sequence without one has no model to make it in.
 const Delta& firstLive(const std::vector<Delta>& deltas) {
   if (deltas.empty()) qf::zero::reportException(messages::CannotComposeZeroDeltas());
-  const auto live = std::find_if(deltas.begin(), deltas.end(), [](const Delta& d) { return history::isLive(d); });
+  const auto live =
+      std::find_if(deltas.begin(), deltas.end(), [](const Delta& d) { return history::isLive(d); });
   if (live == deltas.end()) qf::zero::reportException(qf0::messages::ElementRequired(u"kiv.Delta.compose"));
   return *live;
 }
@@ -78,7 +78,8 @@ Delta Delta::Impl::compose(const std::vector<Delta>& deltas) {
   for (std::size_t i = 0; i < n; ++i) {
     if (history::isLive(deltas[i])) {
       forEachPresent(deltas[i]->current_, [&](const Uuid& uuid, const ObjectStorage& storage) {
-        if (!presentEntry(current, uuid) && !lifecycles.deletedMoreRecentlyThan(uuid, i)) current.add(storage);
+        if (!presentEntry(current, uuid) && !lifecycles.deletedMoreRecentlyThan(uuid, i))
+          current.add(storage);
       });
     }
     const std::size_t older = n - 1 - i;

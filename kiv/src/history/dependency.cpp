@@ -1,5 +1,4 @@
 #include "kiv/metamodel/dependency_impl.h"
-
 #include "kiv/metamodel/repository.h"
 
 namespace kiv {

@@ -18,8 +18,8 @@ bool hasManyValuedOpposite(const qf::zero::meta::Property& property) {
 
 void ElementReuseModelBuilder::clearObjectValue(qf::zero::ModelElement& element,
                                                 const qf::zero::meta::Property& property) {
-  const bool unresolvedView = property->isReference() && reuse_ && !property->isContainment() &&
-                              hasManyValuedOpposite(property);
+  const bool unresolvedView =
+      property->isReference() && reuse_ && !property->isContainment() && hasManyValuedOpposite(property);
   const qf::zero::AccessTag tag =
       unresolvedView ? qf::zero::AccessTag::NoProxyResolve : qf::zero::AccessTag::Default;
   element->getPropertyValue(property, tag).getValue<qf::zero::AbstractOwnedCollection*>()->genericClear();

@@ -15,7 +15,8 @@
 
 namespace kiv::history {
 
-using StorageMap = qf::zero::TypedReferenceCollectionWithProxies<ObjectStorage, std::map<qf::zero::Uuid, ObjectStorage>>;
+using StorageMap =
+    qf::zero::TypedReferenceCollectionWithProxies<ObjectStorage, std::map<qf::zero::Uuid, ObjectStorage>>;
 
 // A transaction (a savepoint of the caller's, when one is open) on the model of
 // `element`, which must be live: proxies and destroyed elements raise.

@@ -1,7 +1,6 @@
-#include "kiv/metamodel/object_storage_impl.h"
-
 #include "history/history_support.h"
 #include "kiv/history/element_reuse_model_builder.h"
+#include "kiv/metamodel/object_storage_impl.h"
 #include "qf/zero/core/value.h"
 #include "qf/zero/io/json_constants.h"
 #include "qf/zero/io/json_parser.h"

@@ -9,7 +9,8 @@ using foundation::core::except::CatalogEntry;
 
 constexpr CatalogEntry entries[] = {
     {"BranchExists", "A branch named '{1}' already exists."},
-    {"CannotAddParent", "Commit {1} cannot become a parent: it descends from the commit, and history must not loop."},
+    {"CannotAddParent",
+     "Commit {1} cannot become a parent: it descends from the commit, and history must not loop."},
     {"CannotCheckout", "Cannot check out branch '{1}'."},
     {"CannotCommit", "Cannot commit in the current state of the repository."},
     {"CannotComposeZeroDeltas", "Cannot compose an empty sequence of deltas."},

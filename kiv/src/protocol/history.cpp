@@ -1,5 +1,4 @@
 #include "kiv/metamodel/protocol/history_impl.h"
-
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/report_exception.h"
 
@@ -7,7 +6,10 @@
 
 namespace kiv::protocol {
 
-::kiv::protocol::History History::Impl::parseHistory(const qf::zero::JsonValue& /*historyJson*/, const qf::zero::Model& /*model*/, const std::vector<std::u16string>& /*properties*/, const qf::zero::Model& /*otherModel*/) {
+::kiv::protocol::History History::Impl::parseHistory(const qf::zero::JsonValue& /*historyJson*/,
+                                                     const qf::zero::Model& /*model*/,
+                                                     const std::vector<std::u16string>& /*properties*/,
+                                                     const qf::zero::Model& /*otherModel*/) {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.protocol.History.parseHistory"));
 }
 
@@ -19,15 +21,19 @@ void History::Impl::resolveCommits() {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.protocol.History.resolveCommits"));
 }
 
-::kiv::protocol::History History::Impl::unpack(const qf::zero::JsonValue& /*historyJson*/, const qf::zero::Model& /*model*/, const qf::zero::Model& /*otherModel*/) {
+::kiv::protocol::History History::Impl::unpack(const qf::zero::JsonValue& /*historyJson*/,
+                                               const qf::zero::Model& /*model*/,
+                                               const qf::zero::Model& /*otherModel*/) {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.protocol.History.unpack"));
 }
 
-::kiv::protocol::History History::Impl::unpackBranches(const qf::zero::JsonValue& /*historyJson*/, const qf::zero::Model& /*model*/) {
+::kiv::protocol::History History::Impl::unpackBranches(const qf::zero::JsonValue& /*historyJson*/,
+                                                       const qf::zero::Model& /*model*/) {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.protocol.History.unpackBranches"));
 }
 
-::kiv::protocol::History History::Impl::unpackNonBranches(const qf::zero::JsonValue& /*historyJson*/, const qf::zero::Model& /*model*/) {
+::kiv::protocol::History History::Impl::unpackNonBranches(const qf::zero::JsonValue& /*historyJson*/,
+                                                          const qf::zero::Model& /*model*/) {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.protocol.History.unpackNonBranches"));
 }
 

@@ -1,5 +1,4 @@
 #include "kiv/metamodel/local_repository_impl.h"
-
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/report_exception.h"
 
@@ -41,11 +40,13 @@ void LocalRepository::Impl::checkout(const std::u16string& /*branch*/) {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.LocalRepository.checkout"));
 }
 
-::kiv::LocalRepository LocalRepository::Impl::clone(const ::kiv::Repository& /*origin*/, ::kiv::RepoType /*repoType*/) {
+::kiv::LocalRepository LocalRepository::Impl::clone(const ::kiv::Repository& /*origin*/,
+                                                    ::kiv::RepoType /*repoType*/) {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.LocalRepository.clone"));
 }
 
-::kiv::LocalRepository LocalRepository::Impl::create(const qf::zero::Model& /*kivModel*/, const qf::zero::Model& /*baseModel*/) {
+::kiv::LocalRepository LocalRepository::Impl::create(const qf::zero::Model& /*kivModel*/,
+                                                     const qf::zero::Model& /*baseModel*/) {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.LocalRepository.create"));
 }
 

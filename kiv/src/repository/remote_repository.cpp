@@ -1,5 +1,4 @@
 #include "kiv/metamodel/remote_repository_impl.h"
-
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/report_exception.h"
 

@@ -1,5 +1,4 @@
 #include "kiv/metamodel/repository_impl.h"
-
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/report_exception.h"
 
@@ -19,11 +18,13 @@ void Repository::Impl::remove(const std::u16string& /*branch*/) {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Repository.remove"));
 }
 
-void Repository::Impl::sync(const ::kiv::Repository& /*src*/, const std::function<void(const kiv::Branch&, const kiv::Branch&)>& /*f*/) {
+void Repository::Impl::sync(const ::kiv::Repository& /*src*/,
+                            const std::function<void(const kiv::Branch&, const kiv::Branch&)>& /*f*/) {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Repository.sync"));
 }
 
-void Repository::Impl::setSynchronizationChannel(const std::shared_ptr<qf::zero::io::SynchronizationChannel>& /*channel*/) {
+void Repository::Impl::setSynchronizationChannel(
+    const std::shared_ptr<qf::zero::io::SynchronizationChannel>& /*channel*/) {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Repository.setSynchronizationChannel"));
 }
 
@@ -31,15 +32,18 @@ bool Repository::Impl::canCheckout(const std::u16string& /*branch*/) const {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Repository.canCheckout"));
 }
 
-void Repository::Impl::syncCreated(const ::kiv::Repository& /*src*/, const std::function<void(const kiv::Branch&)>& /*f*/) {
+void Repository::Impl::syncCreated(const ::kiv::Repository& /*src*/,
+                                   const std::function<void(const kiv::Branch&)>& /*f*/) {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Repository.syncCreated"));
 }
 
-void Repository::Impl::syncUpdated(const ::kiv::Repository& /*src*/, const std::function<void(const kiv::Branch&, const kiv::Branch&)>& /*f*/) {
+void Repository::Impl::syncUpdated(const ::kiv::Repository& /*src*/,
+                                   const std::function<void(const kiv::Branch&, const kiv::Branch&)>& /*f*/) {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Repository.syncUpdated"));
 }
 
-void Repository::Impl::syncDeleted(const ::kiv::Repository& /*src*/, const std::function<void(const kiv::Branch&)>& /*f*/) {
+void Repository::Impl::syncDeleted(const ::kiv::Repository& /*src*/,
+                                   const std::function<void(const kiv::Branch&)>& /*f*/) {
   qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Repository.syncDeleted"));
 }
 

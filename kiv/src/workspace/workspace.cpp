@@ -1,5 +1,4 @@
 #include "kiv/metamodel/workspace_impl.h"
-
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/report_exception.h"
 

@@ -1,6 +1,5 @@
 // The umbrella header stands alone, and the example it opens with does what it says.
 #include "kiv/kiv.h"
-
 #include "support/test_metamodel.h"
 
 #include <gtest/gtest.h>

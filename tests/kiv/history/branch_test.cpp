@@ -12,7 +12,9 @@ using namespace history_test;
 kiv::Commit commitOn(const Model& model, const kiv::Commit& parent = {}, const qf::zero::Uuid& id = {}) {
   const kiv::ObjectStorage storage =
       kiv::ObjectStorage::Builder(model).doSetElementUUID(qf::zero::generateNewUuid()).create();
-  kiv::Commit commit = kiv::Commit::Builder(model).doSetDelta(kiv::Delta::Builder(model).doAddCurrent(storage).create()).create(id);
+  kiv::Commit commit = kiv::Commit::Builder(model)
+                           .doSetDelta(kiv::Delta::Builder(model).doAddCurrent(storage).create())
+                           .create(id);
   if (parent) commit->addParent(parent);
   return commit;
 }
@@ -72,9 +74,11 @@ TEST_F(Branches, UndoAndRedoMoveTheTipAlongFirstParents) {
   const kiv::Delta inverse = branch->undo();
   EXPECT_EQ(branch.getTip(), b);
   EXPECT_EQ(branch.getRedoStack().getTypedValues(), std::vector<kiv::Commit>{c});
-  EXPECT_EQ(inverse.getPrevious().getTypedValues(), c.getDelta().getCurrent().getTypedValues()) << "shared storages";
+  EXPECT_EQ(inverse.getPrevious().getTypedValues(), c.getDelta().getCurrent().getTypedValues())
+      << "shared storages";
   branch->undo();
-  EXPECT_EQ(branch.getRedoStack().getTypedValues(), (std::vector<kiv::Commit>{c, b})) << "most recently undone last";
+  EXPECT_EQ(branch.getRedoStack().getTypedValues(), (std::vector<kiv::Commit>{c, b}))
+      << "most recently undone last";
 
   EXPECT_EQ(branch->redo(), b.getDelta()) << "the redone commit's own delta";
   EXPECT_EQ(branch.getTip(), b);

@@ -24,14 +24,16 @@ TEST_F(Commits, RecordingStoresEachStateOnceAndSharesThePreviousOne) {
 
   const kiv::Commit second = record(repository, user, {first}, [&] { tm.setName(x, u"y"); });
   EXPECT_TRUE(second.getDelta()->isUpdated(x.getUuid()));
-  EXPECT_EQ(second.getDelta()->getPrevious(x.getUuid()), created) << "shared with the commit that recorded it";
+  EXPECT_EQ(second.getDelta()->getPrevious(x.getUuid()), created)
+      << "shared with the commit that recorded it";
   EXPECT_EQ(nameIn(second->find(x.getUuid())), u"y");
   EXPECT_EQ(first->find(x.getUuid()), created);
 
   const kiv::Commit third = record(repository, user, {second}, [&] { x.destroy(); });
   EXPECT_TRUE(third.getDelta()->isDeleted(x.getUuid()));
   EXPECT_EQ(third.getDelta()->getPrevious(x.getUuid()), second->find(x.getUuid()));
-  EXPECT_EQ(third->find(x.getUuid()), second->find(x.getUuid())) << "find looks at currents only, not at deletions";
+  EXPECT_EQ(third->find(x.getUuid()), second->find(x.getUuid()))
+      << "find looks at currents only, not at deletions";
 }
 
 TEST_F(Commits, UpdatingAnElementWithoutStoredStateIsRefusedAndChangesNothing) {
@@ -94,9 +96,8 @@ TEST_F(Commits, DiffBetweenUnrelatedHistoriesGoesThroughNothing) {
   ModelElement y;
   const Model otherUser = Model::create();
   const kiv::Commit mine = record(repository, user, {}, [&] { x = nodeNamed(u"x"); });
-  const kiv::Commit theirRoot = record(repository, otherUser, {}, [&] {
-    y = tm.node.instantiate(otherUser);
-  });
+  const kiv::Commit theirRoot =
+      record(repository, otherUser, {}, [&] { y = tm.node.instantiate(otherUser); });
   const kiv::Commit theirs = record(repository, otherUser, {theirRoot}, [&] { tm.setName(y, u"y"); });
 
   const kiv::Delta throughNothing = mine->diff(theirs);
@@ -155,7 +156,8 @@ TEST_F(Commits, WipeOutDestroysTheCommitItsDeltaAndItsStoragesEvenShared) {
   EXPECT_FALSE(root.isLive());
   EXPECT_FALSE(delta.isLive());
   EXPECT_FALSE(shared.isLive());
-  EXPECT_FALSE(next.getDelta()->getPrevious(x.getUuid())) << "the later commit lost its shared previous state";
+  EXPECT_FALSE(next.getDelta()->getPrevious(x.getUuid()))
+      << "the later commit lost its shared previous state";
 }
 
 TEST_F(Commits, HistoryCannotLoop) {

@@ -11,15 +11,18 @@ using namespace history_test;
 using Deltas = HistoryTest;
 
 TEST_F(Deltas, ChangeReportListsStatesByKindInUuidOrder) {
-  EXPECT_EQ(
-      kiv::Delta::create(repository).toChangeReport(),
-      (JsonValue{{"added", JsonValue::array()}, {"modified", JsonValue::array()}, {"destroyed", JsonValue::array()}}));
+  EXPECT_EQ(kiv::Delta::create(repository).toChangeReport(), (JsonValue{{"added", JsonValue::array()},
+                                                                        {"modified", JsonValue::array()},
+                                                                        {"destroyed", JsonValue::array()}}));
 
   std::vector<Uuid> ids = {a, b, c, qf::zero::generateNewUuid(), qf::zero::generateNewUuid()};
   std::sort(ids.begin(), ids.end());
   const auto entry = [](const char* state) { return JsonValue{{"type", "no.Such"}, {"state", state}}; };
   const auto storage = [&](std::size_t i, const char* state) {
-    return kiv::ObjectStorage::Builder(repository).doSetElementUUID(ids[i]).doSetContent(entry(state)).create();
+    return kiv::ObjectStorage::Builder(repository)
+        .doSetElementUUID(ids[i])
+        .doSetContent(entry(state))
+        .create();
   };
   const kiv::Delta delta = kiv::Delta::create(repository);
   delta.addDeleted(storage(4, "gone"));
@@ -50,7 +53,8 @@ const DestroyedEntryCase kDestroyedEntryCases[] = {
          "friends": ["$C2"], "best": "$C3", "tags": ["$C2"], "count": 7}})",
      R"({"type": "tm.Node", "id": "$P", "content": {"name": "p", "children": ["$C1"],
          "friends": ["$C2"], "best": "$C3", "tags": ["$C2"], "count": 7}})"},
-    {"InheritedContainment", R"({"type": "tm.Gadget", "id": "$P", "content": {"children": ["$C3", "$C1"], "x": 1}})",
+    {"InheritedContainment",
+     R"({"type": "tm.Gadget", "id": "$P", "content": {"children": ["$C3", "$C1"], "x": 1}})",
      R"({"type": "tm.Gadget", "id": "$P", "content": {"children": ["$C1"], "x": 1}})"},
     {"UnknownTypeUnchanged", R"({"type": "tm.Nothing", "id": "$P", "content": {"children": ["$C2"]}})",
      R"({"type": "tm.Nothing", "id": "$P", "content": {"children": ["$C2"]}})"},
@@ -71,15 +75,19 @@ class DeltaDestroyedEntry : public ::testing::TestWithParam<DestroyedEntryCase>,
   }
 
   // P sorts first, so its entry is reported first.
-  const std::map<std::string, Uuid> ids = {{"$P", *qf::zero::parseUuid("00000000-0000-4000-8000-000000000001")},
-                                           {"$C1", *qf::zero::parseUuid("00000000-0000-4000-8000-000000000002")},
-                                           {"$C2", *qf::zero::parseUuid("00000000-0000-4000-8000-000000000003")},
-                                           {"$C3", *qf::zero::parseUuid("00000000-0000-4000-8000-000000000004")}};
+  const std::map<std::string, Uuid> ids = {
+      {"$P", *qf::zero::parseUuid("00000000-0000-4000-8000-000000000001")},
+      {"$C1", *qf::zero::parseUuid("00000000-0000-4000-8000-000000000002")},
+      {"$C2", *qf::zero::parseUuid("00000000-0000-4000-8000-000000000003")},
+      {"$C3", *qf::zero::parseUuid("00000000-0000-4000-8000-000000000004")}};
 };
 
 TEST_P(DeltaDestroyedEntry, IsReported) {
   const auto storage = [&](const char* id, const JsonValue& content) {
-    return kiv::ObjectStorage::Builder(repository).doSetElementUUID(ids.at(id)).doSetContent(content).create();
+    return kiv::ObjectStorage::Builder(repository)
+        .doSetElementUUID(ids.at(id))
+        .doSetContent(content)
+        .create();
   };
   const JsonValue child = document(R"({"type": "tm.Node", "id": "$C1", "content": {}})");
   const kiv::Delta delta = kiv::Delta::create(repository);

@@ -113,7 +113,8 @@ class DeltaCompose : public ::testing::TestWithParam<ComposeCase> {
       present += (before ? 1 : 0) + (after ? 1 : 0);
     }
     if (delta.getIsSnapshot()) word("!");
-    const std::size_t entries = delta.getPrevious().container().size() + delta.getCurrent().container().size();
+    const std::size_t entries =
+        delta.getPrevious().container().size() + delta.getCurrent().container().size();
     if (entries != present) text += " (and " + std::to_string(entries - present) + " other entries)";
     return text;
   }

@@ -12,7 +12,8 @@ struct Scene : HistoryModels {
   const Uuid fresh = qf::zero::generateNewUuid();
   // `delta` creates a, deletes b and updates c.
   kiv::Delta delta = kiv::Delta::create(repository);
-  kiv::ObjectStorage a2 = stored(a, "a2"), b2 = stored(b, "b2"), c2 = stored(c, "c2"), fresh0 = stored(fresh, "fresh0");
+  kiv::ObjectStorage a2 = stored(a, "a2"), b2 = stored(b, "b2"), c2 = stored(c, "c2"),
+                     fresh0 = stored(fresh, "fresh0");
   kiv::ObjectStorage foreign = storageOf(elsewhere, fresh, "foreign");
   kiv::Delta foreignDelta = kiv::Delta::create(elsewhere);
 
@@ -34,7 +35,8 @@ const FailureCase kFailureCases[] = {
     {"AddCreatedUnderATakenKey", "UniquenessConstraint", [](Scene& s) { s.delta.addCreated(s.a2); }},
     {"AddDeletedUnderATakenKey", "UniquenessConstraint", [](Scene& s) { s.delta.addDeleted(s.b2); }},
     // The previous entry is added before the current one fails: it must go again.
-    {"AddUpdatedWhoseCurrentKeyIsTaken", "UniquenessConstraint", [](Scene& s) { s.delta.addUpdated(s.fresh0, s.a2); }},
+    {"AddUpdatedWhoseCurrentKeyIsTaken", "UniquenessConstraint",
+     [](Scene& s) { s.delta.addUpdated(s.fresh0, s.a2); }},
     {"AddUpdatedOfATakenCurrent", "UniquenessConstraint", [](Scene& s) { s.delta.addUpdated(s.c2); }},
     {"AddCreatedFromAnotherModel", "CannotCreateCrossModelAssociation",
      [](Scene& s) { s.delta.addCreated(s.foreign); }},
@@ -42,9 +44,14 @@ const FailureCase kFailureCases[] = {
     {"SetPreviousFromAnotherModel", "CannotCreateCrossModelAssociation",
      [](Scene& s) { s.delta.setPrevious(s.foreignDelta); }},
     {"ComposeNothing", "CannotComposeZeroDeltas", [](Scene&) { kiv::Delta::compose({}); }},
-    {"ComposeOnlyNullDeltas", "ElementRequired", [](Scene&) { kiv::Delta::compose({kiv::Delta(), kiv::Delta()}); }},
+    {"ComposeOnlyNullDeltas", "ElementRequired",
+     [](Scene&) {
+       kiv::Delta::compose({kiv::Delta(), kiv::Delta()});
+     }},
     {"ComposeAcrossModels", "CannotCreateCrossModelAssociation",
-     [](Scene& s) { kiv::Delta::compose({s.delta, s.foreignDelta}); }},
+     [](Scene& s) {
+       kiv::Delta::compose({s.delta, s.foreignDelta});
+     }},
 };
 
 class DeltaFailure : public ::testing::TestWithParam<FailureCase> {};

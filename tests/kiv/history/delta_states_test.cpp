@@ -152,7 +152,8 @@ TEST_F(Deltas, SetPreviousTakesTheOtherDeltasPresentCurrentStates) {
 TEST_F(Deltas, InvertSwapsTheMapsAndSharesTheStorages) {
   for (const bool snapshot : {false, true}) {
     SCOPED_TRACE(snapshot ? "snapshot" : "not a snapshot");
-    const kiv::ObjectStorage a1 = stored(a, "a1"), b0 = stored(b, "b0"), b1 = stored(b, "b1"), c0 = stored(c, "c0");
+    const kiv::ObjectStorage a1 = stored(a, "a1"), b0 = stored(b, "b0"), b1 = stored(b, "b1"),
+                             c0 = stored(c, "c0");
     const kiv::Delta delta = kiv::Delta::Builder(repository).doSetIsSnapshot(snapshot).create();
     delta.addCreated(a1);
     delta.addUpdated(b0, b1);

@@ -56,7 +56,10 @@ using StorageMap = std::map<Uuid, kiv::ObjectStorage>;
 
 // A storage of `element` whose content is just a label for its state.
 inline kiv::ObjectStorage storageOf(const Model& model, const Uuid& element, const std::string& state) {
-  return kiv::ObjectStorage::Builder(model).doSetElementUUID(element).doSetContent(JsonValue{{"state", state}}).create();
+  return kiv::ObjectStorage::Builder(model)
+      .doSetElementUUID(element)
+      .doSetContent(JsonValue{{"state", state}})
+      .create();
 }
 
 inline StorageMap previousOf(const kiv::Delta& delta) { return delta.getPrevious().container(); }
@@ -88,7 +91,8 @@ struct HistoryModels {
   Model repository = Model::create();
   Model user = Model::create();
   Model elsewhere = Model::create();
-  const Uuid a = qf::zero::generateNewUuid(), b = qf::zero::generateNewUuid(), c = qf::zero::generateNewUuid();
+  const Uuid a = qf::zero::generateNewUuid(), b = qf::zero::generateNewUuid(),
+             c = qf::zero::generateNewUuid();
 };
 
 class HistoryTest : public ::testing::Test, public HistoryModels {};

@@ -43,7 +43,9 @@ class RandomHistory {
   const kiv::Commit& commit(std::size_t i) const { return commits_[i]; }
   std::map<std::string, JsonValue> state(std::size_t i) const { return support::entriesById(states_[i]); }
   Model modelAt(std::size_t i) const { return modelFromDocument(states_[i]); }
-  std::size_t pickAny() { return std::uniform_int_distribution<std::size_t>(0, commits_.size() - 1)(random_); }
+  std::size_t pickAny() {
+    return std::uniform_int_distribution<std::size_t>(0, commits_.size() - 1)(random_);
+  }
   const Model& repository() const { return repository_; }
 
  private:
@@ -111,7 +113,8 @@ TEST_P(HistoryProperties, UndoThenRedoReturnsABranchAndItsModelToWhereTheyWere) 
     }
   }
   // Undo stops at a commit that recorded nothing (every edit of it was refused).
-  const auto firstEmpty = std::find_if(line.begin(), line.end(), [](const kiv::Commit& c) { return c->isEmpty(); });
+  const auto firstEmpty =
+      std::find_if(line.begin(), line.end(), [](const kiv::Commit& c) { return c->isEmpty(); });
   EXPECT_EQ(undone, static_cast<std::size_t>(firstEmpty - line.begin()));
   EXPECT_FALSE(branch->isEmpty()) << "undone commits stay on the redo stack";
   while (branch->canRedo()) apply(branch->redo(), user);

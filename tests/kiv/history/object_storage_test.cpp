@@ -23,9 +23,12 @@ JsonValue fullEntryOf(const ModelElement& element) {
 
 TEST_F(ObjectStorages, IsEmptyUnlessItNamesAnElement) {
   EXPECT_TRUE(kiv::ObjectStorage::create(repository).isEmpty()) << "no element UUID";
-  EXPECT_TRUE(kiv::ObjectStorage::Builder(repository).doSetElementUUID(Uuid()).create().isEmpty()) << "nil UUID";
-  EXPECT_FALSE(
-      kiv::ObjectStorage::Builder(repository).doSetElementUUID(qf::zero::generateNewUuid()).create().isEmpty());
+  EXPECT_TRUE(kiv::ObjectStorage::Builder(repository).doSetElementUUID(Uuid()).create().isEmpty())
+      << "nil UUID";
+  EXPECT_FALSE(kiv::ObjectStorage::Builder(repository)
+                   .doSetElementUUID(qf::zero::generateNewUuid())
+                   .create()
+                   .isEmpty());
   EXPECT_FALSE(kiv::ObjectStorage::create(repository).setContent(gadgetNamed(u"g")).isEmpty());
 }
 
@@ -132,9 +135,10 @@ struct EqualityCase {
   kiv::ObjectStorage (*other)(const kiv::ObjectStorage& mine, const Model& elsewhere);
 };
 
-kiv::ObjectStorage twin(const kiv::ObjectStorage& mine, const Model& elsewhere, const boost::optional<Uuid>& element,
-                        const JsonValue& content) {
-  return kiv::ObjectStorage::Builder(elsewhere).doSetElementUUID(element).doSetContent(content).create(mine.getUuid());
+kiv::ObjectStorage twin(const kiv::ObjectStorage& mine, const Model& elsewhere,
+                        const boost::optional<Uuid>& element, const JsonValue& content) {
+  return kiv::ObjectStorage::Builder(elsewhere).doSetElementUUID(element).doSetContent(content).create(
+      mine.getUuid());
 }
 
 const JsonValue kContent = {{"type", "tm.Node"}, {"id", "e"}, {"content", {{"name", "Zoë"}, {"count", 7}}}};
@@ -169,7 +173,8 @@ const EqualityCase kEqualityCases[] = {
      }},
     {"MembersInAnotherOrder", false,
      [](const kiv::ObjectStorage& mine, const Model& elsewhere) {
-       const JsonValue reordered = {{"type", "tm.Node"}, {"id", "e"}, {"content", {{"count", 7}, {"name", "Zoë"}}}};
+       const JsonValue reordered = {
+           {"type", "tm.Node"}, {"id", "e"}, {"content", {{"count", 7}, {"name", "Zoë"}}}};
        return twin(mine, elsewhere, mine.getElementUUID(), reordered);
      }},
     {"IntegerWrittenAsFloat", false,

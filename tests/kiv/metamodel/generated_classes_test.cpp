@@ -17,11 +17,12 @@
 #include "qf/zero/io/json_serializer.h"
 #include "support/test_metamodel.h"
 
-#include <gtest/gtest.h>
-
 #include <boost/date_time/posix_time/posix_time.hpp>
 #include <boost/optional/optional_io.hpp>
 #include <boost/uuid/uuid_io.hpp>
+
+#include <gtest/gtest.h>
+
 #include <nlohmann/json.hpp>
 
 namespace {
@@ -51,7 +52,9 @@ class GeneratedClasses : public ::testing::Test {
   void SetUp() override { model->addShallowListener(&recorder); }
   void TearDown() override { model->removeListener(&recorder); }
 
-  kiv::Branch branchNamed(const std::u16string& name) { return kiv::Branch::Builder(model).doSetName(name).create(); }
+  kiv::Branch branchNamed(const std::u16string& name) {
+    return kiv::Branch::Builder(model).doSetName(name).create();
+  }
   template <class T>
   T proxyOf() {
     return qf::zero::elementCast<T>(ModelElement::Impl::createProxy(
@@ -85,7 +88,8 @@ TEST_F(GeneratedClasses, SettingTheCurrentValueOpensNoTransaction) {
   EXPECT_TRUE(recorder.reports.empty());
   commit->setUser(u"bob");
   ASSERT_EQ(recorder.reports.size(), 1u);
-  EXPECT_EQ(recorder.reports[0]->getOldValue(commit, package.getCommit_user()), Value::of(std::u16string(u"ann")));
+  EXPECT_EQ(recorder.reports[0]->getOldValue(commit, package.getCommit_user()),
+            Value::of(std::u16string(u"ann")));
 }
 
 TEST_F(GeneratedClasses, EverySetterAndMutableGetterRefusesAProxyFirst) {
@@ -184,7 +188,8 @@ TEST_F(GeneratedClasses, ACancelledTransactionRestoresTheRepositoryExactly) {
   master->setRepository(repository);
   dev->setRepository(repository);
   repository->setHead(master);
-  const auto storage = kiv::ObjectStorage::Builder(model).doSetElementUUID(qf::zero::generateNewUuid()).create();
+  const auto storage =
+      kiv::ObjectStorage::Builder(model).doSetElementUUID(qf::zero::generateNewUuid()).create();
   auto delta = kiv::Delta::create(model);
   delta->getCurrentMutable().add(storage);
   second->setDelta(delta);
@@ -267,9 +272,11 @@ TEST_F(GeneratedClasses, SerializersWriteEnumsByNameRepoInfoByPropertyAndNoPoint
   expected.setIsBare(true);
   expected.setHead(u"master");
   EXPECT_TRUE(info.getValue<kiv::protocol::RepoInfo>().compareWith(expected));
-  EXPECT_EQ(repoInfo->getPropertyValue(info, package.getRepoInfo_head()), Value::of(std::u16string(u"master")));
+  EXPECT_EQ(repoInfo->getPropertyValue(info, package.getRepoInfo_head()),
+            Value::of(std::u16string(u"master")));
   EXPECT_THROW(repoInfo->getPropertyValue(info, package.getBranch_name()), Exception<msg::NoSuchProperty>);
-  EXPECT_THROW(repoInfo->setPropertyValue(info, package.getBranch_name(), Value()), Exception<msg::NoSuchProperty>);
+  EXPECT_THROW(repoInfo->setPropertyValue(info, package.getBranch_name(), Value()),
+               Exception<msg::NoSuchProperty>);
 
   const auto repository = kiv::LocalRepository::Builder(model)
                               .doSetName(u"repo")
@@ -279,8 +286,8 @@ TEST_F(GeneratedClasses, SerializersWriteEnumsByNameRepoInfoByPropertyAndNoPoint
                               .create();
   const auto content = qf::zero::io::JSONSerializer().writeEntry(repository)["content"];
   EXPECT_EQ(content.value("name", ""), "repo");
-  for (const char* unwritten : {"IMergeStrategy", "packetTransport", "numRemoteObservers", "observers",
-                                "repositoryListener"}) {
+  for (const char* unwritten :
+       {"IMergeStrategy", "packetTransport", "numRemoteObservers", "observers", "repositoryListener"}) {
     EXPECT_FALSE(content.contains(unwritten)) << unwritten;
   }
 }
@@ -312,7 +319,8 @@ TEST_F(GeneratedClasses, ReflectionFindsInheritedPropertiesInvokersAndInstances)
                                                          qf::zero::query::SearchClassMatchMode::ExactClass);
   EXPECT_EQ(branches.getTypedInstances().size(), 2u);
   EXPECT_TRUE(exactObservers.getTypedInstances().empty()) << "an abstract class has no exact instances";
-  EXPECT_EQ(kiv::Repository::Constrainables(query).getTypedInstances(), std::vector<kiv::Repository>{repository});
+  EXPECT_EQ(kiv::Repository::Constrainables(query).getTypedInstances(),
+            std::vector<kiv::Repository>{repository});
 }
 
 TEST_F(GeneratedClasses, ConvertingReferencesToProxiesDropsWhatTheElementDoesNotOwn) {

@@ -14,9 +14,10 @@
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/text.h"
 
+#include <boost/date_time/posix_time/posix_time.hpp>
+
 #include <gtest/gtest.h>
 
-#include <boost/date_time/posix_time/posix_time.hpp>
 #include <nlohmann/json.hpp>
 
 #include <functional>
@@ -59,19 +60,23 @@ struct Row {
   std::function<void(const ModelElement&, const Value&)> typedSet;
 };
 
-#define SINGLE(C, qualified, prop, Prop)                                                   \
-  Row{u"" qualified "." #prop, [](const ModelElement& e) { return wrap(as<C>(e)->get##Prop()); }, \
-      [](const ModelElement& e, const Value& v) {                                            \
-        auto typed = as<C>(e);                                                               \
-        typed->set##Prop(v.getValue<std::decay_t<decltype(typed->get##Prop())>>());          \
-      }}
+#define SINGLE(C, qualified, prop, Prop)                                                        \
+  Row {                                                                                         \
+    u"" qualified "." #prop, [](const ModelElement& e) { return wrap(as<C>(e)->get##Prop()); }, \
+        [](const ModelElement& e, const Value& v) {                                             \
+          auto typed = as<C>(e);                                                                \
+          typed->set##Prop(v.getValue<std::decay_t<decltype(typed->get##Prop())>>());           \
+        }                                                                                       \
+  }
 
-#define MANY(C, qualified, prop, Prop)                                                      \
-  Row{u"" qualified "." #prop,                                                               \
-      [](const ModelElement& e) {                                                            \
-        return Value::of(static_cast<const AbstractOwnedCollection*>(&as<C>(e)->get##Prop())); \
-      },                                                                                     \
-      nullptr}
+#define MANY(C, qualified, prop, Prop)                                                           \
+  Row {                                                                                          \
+    u"" qualified "." #prop,                                                                     \
+        [](const ModelElement& e) {                                                              \
+          return Value::of(static_cast<const AbstractOwnedCollection*>(&as<C>(e)->get##Prop())); \
+        },                                                                                       \
+        nullptr                                                                                  \
+  }
 
 const std::vector<Row>& rows() {
   static const std::vector<Row> table = {
@@ -129,7 +134,8 @@ ModelElement instanceOf(const meta::Type& type, const Model& model) {
 // A value of the property's type other than its default: a new element for
 // references, an item for many-valued properties.
 Value sampleOf(const meta::Property& property, const Model& model) {
-  if (property->isReference()) return Value::createElementValue(instanceOf(property->getType(), model), property);
+  if (property->isReference())
+    return Value::createElementValue(instanceOf(property->getType(), model), property);
   const std::u16string type = property->getType().getQualifiedName();
   if (type == u"String") return Value::of(std::u16string(u"sample"));
   if (type == u"Boolean") return Value::of(true);

@@ -3,9 +3,10 @@
 #include "qf/zero/core/meta/meta_registry.h"
 
 #include <boost/date_time/posix_time/posix_time.hpp>
-#include <nlohmann/json.hpp>
 
 #include <gtest/gtest.h>
+
+#include <nlohmann/json.hpp>
 
 #include <set>
 
@@ -41,15 +42,22 @@ INSTANTIATE_TEST_SUITE_P(
                       TextCase{u"UUID", u"0b2c3d4e-0000-4000-8000-00000000abc", false},
                       TextCase{u"DateTime", u"2024-02-29T10:30:00", true},
                       TextCase{u"DateTime", u"2024-02-30T10:30:00", false},
-                      TextCase{u"JsonValue", u"{\"a\":[1,2]}", true}, TextCase{u"JsonValue", u"{\"a\":", false}));
+                      TextCase{u"JsonValue", u"{\"a\":[1,2]}", true},
+                      TextCase{u"JsonValue", u"{\"a\":", false}));
 
 TEST(PrimitiveDefaults, EveryTypeHasAZeroOfItsOwnCppType) {
   auto& registry = meta::MetaRegistry::getInstance();
-  EXPECT_EQ(registry.getPrimitiveType(u"String")->getTraits()->defaultValue().getValue<std::u16string>(), u"");
+  EXPECT_EQ(registry.getPrimitiveType(u"String")->getTraits()->defaultValue().getValue<std::u16string>(),
+            u"");
   EXPECT_EQ(registry.getPrimitiveType(u"Integer")->getTraits()->defaultValue().getValue<int>(), 0);
   EXPECT_TRUE(registry.getPrimitiveType(u"UUID")->getTraits()->defaultValue().getValue<Uuid>().is_nil());
-  EXPECT_TRUE(registry.getPrimitiveType(u"DateTime")->getTraits()->defaultValue().getValue<DateTime>().is_not_a_date_time());
-  EXPECT_TRUE(registry.getPrimitiveType(u"JsonValue")->getTraits()->defaultValue().getValue<JsonValue>().is_null());
+  EXPECT_TRUE(registry.getPrimitiveType(u"DateTime")
+                  ->getTraits()
+                  ->defaultValue()
+                  .getValue<DateTime>()
+                  .is_not_a_date_time());
+  EXPECT_TRUE(
+      registry.getPrimitiveType(u"JsonValue")->getTraits()->defaultValue().getValue<JsonValue>().is_null());
   EXPECT_FALSE(registry.getPrimitiveType(u"HxArray")->getTraits()->defaultValue().getValue<HxArray>());
 }
 

@@ -40,7 +40,8 @@ TEST_F(Reflection, ValuesCastOnlyToWhatTheyHoldAndNameTheTypeAskedFor) {
 
 TEST_F(Reflection, RegistryKnowsTheFrameworkTypesAndRegisteredPackages) {
   auto& registry = meta::MetaRegistry::getInstance();
-  for (const char16_t* name : {u"String", u"Boolean", u"Integer", u"UUID", u"DateTime", u"JsonValue", u"HxArray"}) {
+  for (const char16_t* name :
+       {u"String", u"Boolean", u"Integer", u"UUID", u"DateTime", u"JsonValue", u"HxArray"}) {
     EXPECT_TRUE(registry.getPrimitiveType(name)) << toUtf8(name);
   }
   EXPECT_EQ(registry.getClass(u"ModelElement"), ModelElement::metaClass());
@@ -57,8 +58,10 @@ TEST_F(Reflection, RegistryKnowsTheFrameworkTypesAndRegisteredPackages) {
 TEST_F(Reflection, InvokeCallsTheInvokerWithCheckedArguments) {
   meta::Operation twice = meta::Operation::create(tm.metaModel, {}, u"twice");
   twice->addArgument(meta::Argument::create(tm.metaModel, {}, u"n"));
-  twice->setInvoker(std::make_unique<meta::FunctionInvoker>(
-      [](ModelElement::Impl&, std::vector<Value>& args) { return Value::of(2 * args.at(0).getValue<int>()); }));
+  twice->setInvoker(
+      std::make_unique<meta::FunctionInvoker>([](ModelElement::Impl&, std::vector<Value>& args) {
+        return Value::of(2 * args.at(0).getValue<int>());
+      }));
   meta::Operation bare = meta::Operation::create(tm.metaModel, {}, u"bare");
   ModelElement a = tm.node.instantiate(model);
   EXPECT_EQ(a.invoke(twice, {Value::of(21)}).getValue<int>(), 42);
@@ -109,13 +112,16 @@ TEST_F(Reflection, ProxiesStandInUntilTheirElementIsResident) {
   friends->resolveAll();
   EXPECT_EQ(friends->getAllValuesAndProxies(), (std::vector<ModelElement>{resident}));
 
-  model->setProxyLoader([&](ModelImpl& m, const ProxyId& pid) { return tm.node.instantiate(Model(&m), pid.elementId); });
-  ModelElement later = ModelElement::Impl::createProxy(model.getImpl(), tm.node, ProxyId{generateNewUuid(), {}});
+  model->setProxyLoader(
+      [&](ModelImpl& m, const ProxyId& pid) { return tm.node.instantiate(Model(&m), pid.elementId); });
+  ModelElement later =
+      ModelElement::Impl::createProxy(model.getImpl(), tm.node, ProxyId{generateNewUuid(), {}});
   EXPECT_EQ(model->resolveProxy(holder.getImpl(), later).getUuid(), later.getUuid());
 }
 
 TEST_F(Reflection, InstanceQueriesFollowTheClassHierarchyInCreationOrder) {
-  ModelElement n1 = tm.node.instantiate(model), l1 = tm.leaf.instantiate(model), n2 = tm.node.instantiate(model);
+  ModelElement n1 = tm.node.instantiate(model), l1 = tm.leaf.instantiate(model),
+               n2 = tm.node.instantiate(model);
   EXPECT_EQ(model->getInstances(tm.node, query::SearchClassMatchMode::IncludeSubclasses),
             (std::vector<ModelElement>{n1, l1, n2}));
   EXPECT_EQ(model->getInstances(tm.node, query::SearchClassMatchMode::ExactClass),
@@ -125,7 +131,8 @@ TEST_F(Reflection, InstanceQueriesFollowTheClassHierarchyInCreationOrder) {
 }
 
 TEST_F(Reflection, QueriesFilterTheInstancesOfTheirAttachedClasses) {
-  ModelElement n1 = tm.node.instantiate(model), l1 = tm.leaf.instantiate(model), n2 = tm.node.instantiate(model);
+  ModelElement n1 = tm.node.instantiate(model), l1 = tm.leaf.instantiate(model),
+               n2 = tm.node.instantiate(model);
   tm.setName(n2, u"keep");
   tm.setName(l1, u"keep");
   query::PredicateQuery named(model, [&](const ModelElement& e) {
@@ -136,7 +143,8 @@ TEST_F(Reflection, QueriesFilterTheInstancesOfTheirAttachedClasses) {
     ModelElement::Constrainables everything(named);
     ModelElement::Constrainables leaves(named, tm.leaf, query::SearchClassMatchMode::ExactClass);
     EXPECT_EQ(leaves.getInstances(), (std::vector<ModelElement>{l1}));
-    EXPECT_EQ(named.evaluate(), (std::vector<ModelElement>{l1, n2})) << "overlapping attachments list each once";
+    EXPECT_EQ(named.evaluate(), (std::vector<ModelElement>{l1, n2}))
+        << "overlapping attachments list each once";
   }
   EXPECT_TRUE(named.evaluate().empty()) << "an attachment leaves its query when it goes";
 }

@@ -122,7 +122,8 @@ TEST_F(Structure, ReadOnlyAndSetOncePropertiesTakeTheirFirstValueFromBuilders) {
   builder->setOrAdd(tm.code, Value::of(code));
   ModelElement a = builder->create();
   EXPECT_EQ(a.getPropertyValue(tm.code).getValue<Uuid>(), code);
-  EXPECT_THROW(a.setPropertyValue(tm.code, Value::of(generateNewUuid())), Exception<msg::CannotSetReadOnlyProperty>);
+  EXPECT_THROW(a.setPropertyValue(tm.code, Value::of(generateNewUuid())),
+               Exception<msg::CannotSetReadOnlyProperty>);
 }
 
 TEST_F(Structure, DefaultsComeFromTheProperty) {

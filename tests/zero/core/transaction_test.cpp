@@ -143,7 +143,9 @@ TEST(Transaction, InnerSavepointCancelKeepsOuterChanges) {
 
 struct Recorder : Listener {
   std::shared_ptr<ShallowChangeReport<ModelElement>> last;
-  void transactionCommitted(const std::shared_ptr<ShallowChangeReport<ModelElement>>& report) { last = report; }
+  void transactionCommitted(const std::shared_ptr<ShallowChangeReport<ModelElement>>& report) {
+    last = report;
+  }
 };
 
 TEST(ChangeReport, ChangedBackIsNoChange) {

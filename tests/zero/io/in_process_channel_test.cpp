@@ -1,18 +1,18 @@
 #include "qf/zero/io/in_process_channel.h"
 
-#include <gtest/gtest.h>
-
 #include "support/channel_test_cases.h"
+
+#include <gtest/gtest.h>
 
 namespace support {
 
 namespace {
 
 ChannelKind inProcessChannels() {
-    return {"InProcess", [] {
-                auto [a, b] = qf::zero::io::InProcessChannel::createPair();
-                return ChannelPair{a, b};
-            }};
+  return {"InProcess", [] {
+            auto [a, b] = qf::zero::io::InProcessChannel::createPair();
+            return ChannelPair{a, b};
+          }};
 }
 
 }  // namespace

@@ -50,7 +50,8 @@ TEST_P(ChangeReports, ApplyingATransactionsReportToACopyReproducesIt) {
     transaction.commit();
     if (HasFatalFailure()) return;
     apply(writer.last, copy);
-    ASSERT_EQ(support::entriesById(support::serializeModel(source)), support::entriesById(support::serializeModel(copy)))
+    ASSERT_EQ(support::entriesById(support::serializeModel(source)),
+              support::entriesById(support::serializeModel(copy)))
         << "round " << round << ", report " << writer.last.dump();
   }
 }
@@ -114,15 +115,18 @@ TEST_F(ChangeReports, AMalformedReportChangesNothing) {
   ModelElement a = tm.node.instantiate(source);
   const Model copy = copyOf(source);
   const std::string before = support::dumpModel(copy);
-  ordered_json report = {{"added", ordered_json::array()}, {"modified", ordered_json::array()},
+  ordered_json report = {{"added", ordered_json::array()},
+                         {"modified", ordered_json::array()},
                          {"destroyed", ordered_json::array({{{"type", "tm.Node"}, {"id", a.identifier()}}})}};
-  report["modified"].push_back({{"type", "tm.Node"}, {"id", toText(generateNewUuid())}, {"content", {{"count", "x"}}}});
+  report["modified"].push_back(
+      {{"type", "tm.Node"}, {"id", toText(generateNewUuid())}, {"content", {{"count", "x"}}}});
   EXPECT_THROW(apply(report, copy), foundation::core::except::Exception<qf0::messages::WrongJsonType>);
   EXPECT_EQ(before, support::dumpModel(copy)) << "the destroy before the failure must be undone too";
 
   for (const ordered_json& bad : {ordered_json::array(), ordered_json{{"added", 3}},
                                   ordered_json{{"destroyed", ordered_json::array({{{"id", "nope"}}})}}}) {
-    EXPECT_THROW(apply(bad, copy), foundation::core::except::Exception<qf0::messages::MalformedDocument>) << bad.dump();
+    EXPECT_THROW(apply(bad, copy), foundation::core::except::Exception<qf0::messages::MalformedDocument>)
+        << bad.dump();
   }
   EXPECT_EQ(before, support::dumpModel(copy));
 }

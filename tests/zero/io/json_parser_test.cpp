@@ -1,6 +1,7 @@
 // Reading documents: hostile input is refused with a clear error and changes
 // nothing; the customizer and builder hooks decide what is made.
 #include "qf/zero/io/json_parser.h"
+
 #include "qf/zero/io/json_serializer.h"
 #include "support/json_documents.h"
 #include "support/test_metamodel.h"
@@ -74,14 +75,19 @@ const HostileCase hostileCases[] = {
     {"NotAnObject", [](Documents& d) { d.document = ordered_json::array(); }, "MalformedDocument"},
     {"NoVersion", [](Documents& d) { d.document.erase("version"); }, "MalformedDocument"},
     {"FutureVersion", [](Documents& d) { d.document["version"] = "2.0"; }, "UnsupportedFormatVersion"},
-    {"EntriesNotAnArray", [](Documents& d) { d.document["entries"] = ordered_json::object(); }, "MalformedDocument"},
+    {"EntriesNotAnArray", [](Documents& d) { d.document["entries"] = ordered_json::object(); },
+     "MalformedDocument"},
     {"EntryNotAnObject", [](Documents& d) { d.document["entries"].push_back(42); }, "MalformedDocument"},
-    {"ContentNotAnObject", [](Documents& d) { d.entry(d.c)["content"] = ordered_json::array(); }, "MalformedDocument"},
+    {"ContentNotAnObject", [](Documents& d) { d.entry(d.c)["content"] = ordered_json::array(); },
+     "MalformedDocument"},
     {"UnknownClass", [](Documents& d) { d.entry(d.c)["type"] = "tm.Nope"; }, "NoSuchClass"},
-    {"AbstractClass", [](Documents& d) { d.entry(d.c)["type"] = "ModelElement"; }, "CannotInstantiateAbstractClass"},
+    {"AbstractClass", [](Documents& d) { d.entry(d.c)["type"] = "ModelElement"; },
+     "CannotInstantiateAbstractClass"},
     {"IdNotAUuid", [](Documents& d) { d.entry(d.c)["id"] = "c-17"; }, "MalformedDocument"},
-    {"IdTwiceInTheDocument", [](Documents& d) { d.entry(d.g)["id"] = d.c.identifier(); }, "DuplicateElementId"},
-    {"IdAlreadyInTheModel", [](Documents& d) { d.entry(d.c)["id"] = d.bystander.identifier(); }, "DuplicateElementId"},
+    {"IdTwiceInTheDocument", [](Documents& d) { d.entry(d.g)["id"] = d.c.identifier(); },
+     "DuplicateElementId"},
+    {"IdAlreadyInTheModel", [](Documents& d) { d.entry(d.c)["id"] = d.bystander.identifier(); },
+     "DuplicateElementId"},
     {"UnknownProperty", [](Documents& d) { d.content(d.c)["colour"] = "red"; }, "NoSuchProperty"},
     {"TextForAnInteger", [](Documents& d) { d.content(d.c)["count"] = "7"; }, "WrongJsonType"},
     {"IntegerOverflow", [](Documents& d) { d.content(d.c)["count"] = 1LL << 40; }, "WrongJsonType"},
@@ -92,14 +98,15 @@ const HostileCase hostileCases[] = {
     {"ScalarForASet", [](Documents& d) { d.content(d.c)["tags"] = "a"; }, "WrongJsonType"},
     {"ScalarForADatatype", [](Documents& d) { d.content(d.g)["spot"] = 5; }, "WrongJsonType"},
     {"UnknownDatatypeMember", [](Documents& d) { d.content(d.g)["spot"]["z"] = 1; }, "NoSuchProperty"},
-    {"DanglingReference",
-     [](Documents& d) { d.content(d.g)["best"] = toText(generateNewUuid()); }, "DanglingReference"},
+    {"DanglingReference", [](Documents& d) { d.content(d.g)["best"] = toText(generateNewUuid()); },
+     "DanglingReference"},
     {"ReferenceNotAUuid", [](Documents& d) { d.content(d.g)["best"] = 12; }, "WrongJsonType"},
     {"ContainmentCycle",
      [](Documents& d) { d.content(d.c)["children"] = ordered_json::array({d.p.identifier()}); },
      "CannotCreateCircularContainment"},
     {"ContainedTwice",
-     [](Documents& d) { d.content(d.g)["children"] = ordered_json::array({d.c.identifier()}); }, "MalformedDocument"},
+     [](Documents& d) { d.content(d.g)["children"] = ordered_json::array({d.c.identifier()}); },
+     "MalformedDocument"},
     {"MapKeyTakenTwice",
      [](Documents& d) {
        d.content(d.c)["name"] = "p";
@@ -133,7 +140,8 @@ TEST_F(Documents, AReusingBuilderRefreshesElementsInPlace) {
   EXPECT_EQ(target->getElementCount(), 4u);
   EXPECT_EQ(firstC.getPropertyValue(tm.name).getValue<std::u16string>(), u"renamed");
   EXPECT_EQ(tm.values(firstC, tm.tags)->size(), 1u);
-  EXPECT_THROW(JSONParser().parseVerbatim(document, target), foundation::core::except::Exception<qf0::messages::DuplicateElementId>)
+  EXPECT_THROW(JSONParser().parseVerbatim(document, target),
+               foundation::core::except::Exception<qf0::messages::DuplicateElementId>)
       << "the plain builder never reuses";
 }
 
@@ -144,7 +152,8 @@ TEST_F(Documents, CustomizersChooseWhatIsMadeAndWhatIsRead) {
     bool shallReadProperty(const ModelElement&, const meta::Property& property) override {
       return property != tm->count;
     }
-    ModelElement findReference(ModelBuilder&, const Model&, const meta::Class&, const ElementId& id) override {
+    ModelElement findReference(ModelBuilder&, const Model&, const meta::Class&,
+                               const ElementId& id) override {
       asked.push_back(*id.uuid);
       return ModelElement();
     }
@@ -162,7 +171,8 @@ TEST_F(Documents, CustomizersChooseWhatIsMadeAndWhatIsRead) {
   JSONParser parser(std::move(customizer), nullptr);
   const std::vector<ParseItem> items = parser.parseVerbatim(document, target);
   ASSERT_EQ(items.size(), 2u) << "the gadget entry is skipped";
-  EXPECT_EQ(items[0].getValue().getElement().getPropertyValue(tm.count).getValue<int>(), 7) << "count is not read";
+  EXPECT_EQ(items[0].getValue().getElement().getPropertyValue(tm.count).getValue<int>(), 7)
+      << "count is not read";
   EXPECT_EQ(hooks.packages, (std::vector<std::string>{"/test/tm"}));
   EXPECT_TRUE(hooks.asked.empty()) << "no entry refers to the skipped gadget";
 

@@ -1,10 +1,11 @@
 // What the serializer writes: the document layout, the choices of its customizer,
 // and values whose form a registered serializer decides.
-#include "qf/zero/core/meta/framework_package.h"
+#include "qf/zero/io/json_serializer.h"
+
 #include "qf/zero/core/meta/builtin_property_serializers.h"
+#include "qf/zero/core/meta/framework_package.h"
 #include "qf/zero/io/json_constants.h"
 #include "qf/zero/io/json_parser.h"
-#include "qf/zero/io/json_serializer.h"
 #include "support/json_documents.h"
 #include "support/test_metamodel.h"
 
@@ -47,9 +48,10 @@ TEST_F(Serializer, AnEntryHoldsTypeIdentityAndEveryPersistentPropertyInIndexOrde
   EXPECT_EQ(memberNames(entry), (std::vector<std::string>{"type", "id", "content"}));
   EXPECT_EQ(entry["type"], "tm.Gadget");
   EXPECT_EQ(entry["id"], g.identifier());
-  EXPECT_EQ(memberNames(entry["content"]),
-            (std::vector<std::string>{"name", "count", "kind", "tags", "children", "parent", "friends", "best", "index",
-                                      "born", "code", "weight", "flag", "note", "scores", "spot"}))
+  EXPECT_EQ(
+      memberNames(entry["content"]),
+      (std::vector<std::string>{"name", "count", "kind", "tags", "children", "parent", "friends", "best",
+                                "index", "born", "code", "weight", "flag", "note", "scores", "spot"}))
       << "transient properties are never written";
   EXPECT_EQ(entry["content"]["count"], 7);
   EXPECT_EQ(entry["content"]["flag"], true);
@@ -70,15 +72,15 @@ TEST_F(Serializer, SetsAreWrittenSortedAndSequencesInTheirOrder) {
     tm.refs(a, tm.friends)->add(*it);
     tm.refs(a, tm.children)->add(*it);
   }
-  for (const char16_t* tag : {u"pear", u"apple", u"fig"}) tm.values(a, tm.tags)->genericAdd(Value::of(std::u16string(tag)));
+  for (const char16_t* tag : {u"pear", u"apple", u"fig"})
+    tm.values(a, tm.tags)->genericAdd(Value::of(std::u16string(tag)));
   JSONSerializer serializer;
   const ordered_json content = write(serializer, a)["entries"][0]["content"];
   std::vector<std::string> friends = content["friends"].get<std::vector<std::string>>();
   std::vector<std::string> byUuid;
   for (const ModelElement& e : others) byUuid.push_back(e.identifier());
-  std::sort(byUuid.begin(), byUuid.end(), [](const std::string& x, const std::string& y) {
-    return *parseUuid(x) < *parseUuid(y);
-  });
+  std::sort(byUuid.begin(), byUuid.end(),
+            [](const std::string& x, const std::string& y) { return *parseUuid(x) < *parseUuid(y); });
   EXPECT_EQ(friends, byUuid);
   std::vector<std::string> children = content["children"].get<std::vector<std::string>>();
   std::vector<std::string> inserted;
@@ -109,7 +111,8 @@ TEST_F(Serializer, TheAggregateIsWrittenOnceEachEvenThroughCycles) {
 TEST_F(Serializer, AProxyIsWrittenByTheUuidItStandsFor) {
   ModelElement a = tm.node.instantiate(model);
   const Uuid absent = generateNewUuid();
-  tm.refs(a, tm.friends)->basicAddWithProxy(ModelElement::Impl::createProxy(model.getImpl(), tm.node, ProxyId{absent, {}}));
+  tm.refs(a, tm.friends)
+      ->basicAddWithProxy(ModelElement::Impl::createProxy(model.getImpl(), tm.node, ProxyId{absent, {}}));
   JSONSerializer serializer;
   EXPECT_EQ(write(serializer, a)["entries"][0]["content"]["friends"], ordered_json::array({toText(absent)}));
 }
@@ -159,11 +162,14 @@ class RegisteredSerializers : public ::testing::Test {
     handle->setPropertyIndex(2);
     lamp->addProperty(colour);
     lamp->addProperty(handle);
-    for (const meta::Type& type : {meta::Type(colourEnum), meta::Type(handleType), meta::Type(lamp)}) package->addType(type);
+    for (const meta::Type& type : {meta::Type(colourEnum), meta::Type(handleType), meta::Type(lamp)})
+      package->addType(type);
     registry.registerRootPackage(package);
     auto& serializers = meta::PropertySerializerRegistry::getInstance();
-    serializers.registerPropertySerializer(colourEnum, std::make_unique<meta::DefaultPropertySerializer<Colour>>(colourEnum));
-    serializers.registerPropertySerializer(handleType, std::make_unique<meta::TransientOnlyPropertySerializer<Handle>>());
+    serializers.registerPropertySerializer(
+        colourEnum, std::make_unique<meta::DefaultPropertySerializer<Colour>>(colourEnum));
+    serializers.registerPropertySerializer(handleType,
+                                           std::make_unique<meta::TransientOnlyPropertySerializer<Handle>>());
   }
   ~RegisteredSerializers() override {
     meta::PropertySerializerRegistry::getInstance().unregister(colourEnum);
@@ -185,7 +191,8 @@ TEST_F(RegisteredSerializers, DecideTheFormOfTheirValues) {
   a.setPropertyValue(colour, Value::of(Colour::Blue));
   a.setPropertyValue(handle, Value::of(Handle{7}));
   const ordered_json document = support::serializeModel(model);
-  EXPECT_EQ(document["entries"][0]["content"], ordered_json({{"colour", "Blue"}})) << "handles are never written";
+  EXPECT_EQ(document["entries"][0]["content"], ordered_json({{"colour", "Blue"}}))
+      << "handles are never written";
 
   Model copy = Model::create();
   JSONParser().parseVerbatim(document, copy);
@@ -195,7 +202,8 @@ TEST_F(RegisteredSerializers, DecideTheFormOfTheirValues) {
 
   ordered_json bad = document;
   bad["entries"][0]["content"]["colour"] = "Green";
-  EXPECT_THROW(JSONParser().parseVerbatim(bad, Model::create()), foundation::core::except::Exception<qf0::messages::InvalidValue>);
+  EXPECT_THROW(JSONParser().parseVerbatim(bad, Model::create()),
+               foundation::core::except::Exception<qf0::messages::InvalidValue>);
 }
 
 }  // namespace

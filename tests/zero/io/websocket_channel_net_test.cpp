@@ -1,4 +1,5 @@
 #include "qf/zero/io/websocket_channel.h"
+#include "support/channel_test_cases.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -13,8 +14,6 @@
 #include <memory>
 #include <string>
 
-#include "support/channel_test_cases.h"
-
 namespace support {
 
 namespace {
@@ -26,95 +25,92 @@ using ListenFailed = Raised<qf0::messages::ListenFailed>;
 
 // Accepted channels, handed over one at a time.
 class AcceptedChannels {
-public:
-    WebSocketListener::AcceptHandler handler() {
-        return [this](std::shared_ptr<SynchronizationChannel> channel) {
-            std::lock_guard lock(mutex_);
-            accepted_.push_back(std::move(channel));
-            changed_.notify_all();
-        };
-    }
+ public:
+  WebSocketListener::AcceptHandler handler() {
+    return [this](std::shared_ptr<SynchronizationChannel> channel) {
+      std::lock_guard lock(mutex_);
+      accepted_.push_back(std::move(channel));
+      changed_.notify_all();
+    };
+  }
 
-    std::shared_ptr<SynchronizationChannel> next() {
-        std::unique_lock lock(mutex_);
-        changed_.wait_for(lock, patience, [&] { return !accepted_.empty(); });
-        if (accepted_.empty())
-            return nullptr;
-        auto channel = std::move(accepted_.front());
-        accepted_.pop_front();
-        return channel;
-    }
+  std::shared_ptr<SynchronizationChannel> next() {
+    std::unique_lock lock(mutex_);
+    changed_.wait_for(lock, patience, [&] { return !accepted_.empty(); });
+    if (accepted_.empty()) return nullptr;
+    auto channel = std::move(accepted_.front());
+    accepted_.pop_front();
+    return channel;
+  }
 
-    std::size_t waiting() {
-        std::lock_guard lock(mutex_);
-        return accepted_.size();
-    }
+  std::size_t waiting() {
+    std::lock_guard lock(mutex_);
+    return accepted_.size();
+  }
 
-private:
-    std::mutex mutex_;
-    std::condition_variable changed_;
-    std::deque<std::shared_ptr<SynchronizationChannel>> accepted_;
+ private:
+  std::mutex mutex_;
+  std::condition_variable changed_;
+  std::deque<std::shared_ptr<SynchronizationChannel>> accepted_;
 };
 
 ChannelKind webSocketChannels() {
-    return {"WebSocket", [] {
-                AcceptedChannels accepted;
-                WebSocketListener listener("127.0.0.1", 0, accepted.handler());
-                auto client = WebSocketChannel::connect("127.0.0.1", listener.getPort());
-                auto server = accepted.next();
-                if (!server)
-                    throw std::runtime_error("the listener accepted nothing");
-                return ChannelPair{client, server};  // both outlive the listener
-            }};
+  return {"WebSocket", [] {
+            AcceptedChannels accepted;
+            WebSocketListener listener("127.0.0.1", 0, accepted.handler());
+            auto client = WebSocketChannel::connect("127.0.0.1", listener.getPort());
+            auto server = accepted.next();
+            if (!server) throw std::runtime_error("the listener accepted nothing");
+            return ChannelPair{client, server};  // both outlive the listener
+          }};
 }
 
 // A TCP peer that speaks no WebSocket unless told to, for what a proper client never does.
 class RawPeer {
-public:
-    explicit RawPeer(std::uint16_t port) : fd_(::socket(AF_INET, SOCK_STREAM, 0)) {
-        sockaddr_in address{};
-        address.sin_family = AF_INET;
-        address.sin_port = htons(port);
-        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-        if (fd_ < 0 || ::connect(fd_, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0)
-            throw std::runtime_error("cannot connect the raw peer");
-    }
-    ~RawPeer() { drop(); }
+ public:
+  explicit RawPeer(std::uint16_t port) : fd_(::socket(AF_INET, SOCK_STREAM, 0)) {
+    sockaddr_in address{};
+    address.sin_family = AF_INET;
+    address.sin_port = htons(port);
+    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    if (fd_ < 0 || ::connect(fd_, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0)
+      throw std::runtime_error("cannot connect the raw peer");
+  }
+  ~RawPeer() { drop(); }
 
-    void write(const std::string& bytes) {
-        if (::send(fd_, bytes.data(), bytes.size(), MSG_NOSIGNAL) != static_cast<ssize_t>(bytes.size()))
-            throw std::runtime_error("the raw peer cannot write");
-    }
+  void write(const std::string& bytes) {
+    if (::send(fd_, bytes.data(), bytes.size(), MSG_NOSIGNAL) != static_cast<ssize_t>(bytes.size()))
+      throw std::runtime_error("the raw peer cannot write");
+  }
 
-    // Sends an opening handshake and returns the status line of the answer.
-    std::string handshake() {
-        write("GET / HTTP/1.1\r\nHost: 127.0.0.1\r\nUpgrade: websocket\r\nConnection: Upgrade\r\n"
-              "Sec-WebSocket-Key: dGhlIHNhbXBsZSBub25jZQ==\r\nSec-WebSocket-Version: 13\r\n\r\n");
-        std::string answer;
-        char c = 0;
-        while (answer.find("\r\n\r\n") == std::string::npos && ::recv(fd_, &c, 1, 0) == 1)
-            answer += c;
-        return answer.substr(0, answer.find("\r\n"));
-    }
+  // Sends an opening handshake and returns the status line of the answer.
+  std::string handshake() {
+    write(
+        "GET / HTTP/1.1\r\nHost: 127.0.0.1\r\nUpgrade: websocket\r\nConnection: Upgrade\r\n"
+        "Sec-WebSocket-Key: dGhlIHNhbXBsZSBub25jZQ==\r\nSec-WebSocket-Version: 13\r\n\r\n");
+    std::string answer;
+    char c = 0;
+    while (answer.find("\r\n\r\n") == std::string::npos && ::recv(fd_, &c, 1, 0) == 1) answer += c;
+    return answer.substr(0, answer.find("\r\n"));
+  }
 
-    // Everything until the other side closes the connection.
-    std::string readUntilClosed() {
-        std::string all;
-        char buffer[256];
-        for (ssize_t n; (n = ::recv(fd_, buffer, sizeof buffer, 0)) > 0;)
-            all.append(buffer, static_cast<std::size_t>(n));
-        return all;
-    }
+  // Everything until the other side closes the connection.
+  std::string readUntilClosed() {
+    std::string all;
+    char buffer[256];
+    for (ssize_t n; (n = ::recv(fd_, buffer, sizeof buffer, 0)) > 0;)
+      all.append(buffer, static_cast<std::size_t>(n));
+    return all;
+  }
 
-    // Vanishes without a closing handshake.
-    void drop() {
-        if (fd_ >= 0)
-            ::close(fd_);
-        fd_ = -1;
-    }
+  // Vanishes without a closing handshake.
+  void drop() {
+    if (fd_ >= 0) ::close(fd_);
+    fd_ = -1;
+  }
 
-private:
-    int fd_;
+ private:
+  int fd_;
 };
 
 }  // namespace
@@ -123,58 +119,58 @@ INSTANTIATE_TEST_SUITE_P(WebSocket, ChannelContract, testing::Values(webSocketCh
 INSTANTIATE_TEST_SUITE_P(WebSocket, PacketExchange, testing::Values(webSocketChannels()), kindName);
 
 TEST(WebSocketChannel, ConnectingWhereNobodyListensOrListeningWhereSomeoneDoesFails) {
-    std::uint16_t freePort = 0;
-    {
-        AcceptedChannels accepted;
-        WebSocketListener listener("127.0.0.1", 0, accepted.handler());
-        freePort = listener.getPort();
-        EXPECT_THROW(WebSocketChannel::connect("127.0.0.1", freePort, "no-slash"), ConnectionFailed);
-        EXPECT_THROW(WebSocketListener("127.0.0.1", freePort, accepted.handler()), ListenFailed);
-    }
-    try {
-        WebSocketChannel::connect("127.0.0.1", freePort);
-        ADD_FAILURE() << "connected to a closed port";
-    } catch (const ConnectionFailed& error) {
-        EXPECT_THAT(error.what(), testing::HasSubstr("127.0.0.1:" + std::to_string(freePort)));
-    }
+  std::uint16_t freePort = 0;
+  {
+    AcceptedChannels accepted;
+    WebSocketListener listener("127.0.0.1", 0, accepted.handler());
+    freePort = listener.getPort();
+    EXPECT_THROW(WebSocketChannel::connect("127.0.0.1", freePort, "no-slash"), ConnectionFailed);
+    EXPECT_THROW(WebSocketListener("127.0.0.1", freePort, accepted.handler()), ListenFailed);
+  }
+  try {
+    WebSocketChannel::connect("127.0.0.1", freePort);
+    ADD_FAILURE() << "connected to a closed port";
+  } catch (const ConnectionFailed& error) {
+    EXPECT_THAT(error.what(), testing::HasSubstr("127.0.0.1:" + std::to_string(freePort)));
+  }
 }
 
 TEST(WebSocketChannel, APeerThatVanishesWithoutClosingHandshakeClosesTheOtherEnd) {
-    AcceptedChannels accepted;
-    WebSocketListener listener("127.0.0.1", 0, accepted.handler());
-    RawPeer peer(listener.getPort());
-    EXPECT_EQ(peer.handshake(), "HTTP/1.1 101 Switching Protocols");
-    auto channel = accepted.next();
-    ASSERT_TRUE(channel);
-    auto inbox = Inbox::startOn(*channel);
+  AcceptedChannels accepted;
+  WebSocketListener listener("127.0.0.1", 0, accepted.handler());
+  RawPeer peer(listener.getPort());
+  EXPECT_EQ(peer.handshake(), "HTTP/1.1 101 Switching Protocols");
+  auto channel = accepted.next();
+  ASSERT_TRUE(channel);
+  auto inbox = Inbox::startOn(*channel);
 
-    peer.drop();
-    EXPECT_THAT(inbox->closedReason().value_or("none"), testing::StartsWith("connection lost"));
-    EXPECT_THROW(channel->send("anyone?"), Raised<qf0::messages::ChannelClosed>);
+  peer.drop();
+  EXPECT_THAT(inbox->closedReason().value_or("none"), testing::StartsWith("connection lost"));
+  EXPECT_THROW(channel->send("anyone?"), Raised<qf0::messages::ChannelClosed>);
 }
 
 TEST(WebSocketListener, PeersThatFailOrStallTheHandshakeAreDroppedUnseen) {
-    AcceptedChannels accepted;
-    auto listener = std::make_unique<WebSocketListener>("127.0.0.1", 0, accepted.handler());
-    {
-        RawPeer garbage(listener->getPort());
-        garbage.write("HELLO\r\n\r\n");
-        EXPECT_THAT(garbage.readUntilClosed(), testing::Not(testing::HasSubstr("101")));
-    }
-    RawPeer stalled(listener->getPort());  // connects and never speaks
-    auto channel = WebSocketChannel::connect("127.0.0.1", listener->getPort());
-    auto server = accepted.next();
-    ASSERT_TRUE(server);
-    EXPECT_EQ(accepted.waiting(), 0u);
+  AcceptedChannels accepted;
+  auto listener = std::make_unique<WebSocketListener>("127.0.0.1", 0, accepted.handler());
+  {
+    RawPeer garbage(listener->getPort());
+    garbage.write("HELLO\r\n\r\n");
+    EXPECT_THAT(garbage.readUntilClosed(), testing::Not(testing::HasSubstr("101")));
+  }
+  RawPeer stalled(listener->getPort());  // connects and never speaks
+  auto channel = WebSocketChannel::connect("127.0.0.1", listener->getPort());
+  auto server = accepted.next();
+  ASSERT_TRUE(server);
+  EXPECT_EQ(accepted.waiting(), 0u);
 
-    // Closing the listener drops the stalled peer without waiting for its handshake timeout,
-    // and leaves the accepted channel open.
-    const auto started = std::chrono::steady_clock::now();
-    listener.reset();
-    EXPECT_LT(std::chrono::steady_clock::now() - started, std::chrono::seconds(5));
-    auto inbox = Inbox::startOn(*server);
-    channel->send("still open");
-    EXPECT_EQ(inbox->next(), "still open");
+  // Closing the listener drops the stalled peer without waiting for its handshake timeout,
+  // and leaves the accepted channel open.
+  const auto started = std::chrono::steady_clock::now();
+  listener.reset();
+  EXPECT_LT(std::chrono::steady_clock::now() - started, std::chrono::seconds(5));
+  auto inbox = Inbox::startOn(*server);
+  channel->send("still open");
+  EXPECT_EQ(inbox->next(), "still open");
 }
 
 }  // namespace support

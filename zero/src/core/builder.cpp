@@ -49,7 +49,9 @@ void Builder::apply() {
 
 void Builder::doSetOrAdd(Impl& element, const meta::Property& property, const Value& value) {
   if (property->isMany() && !value.isList()) {
-    element.getPropertyValue(property, AccessTag::NoProxyResolve).getValue<AbstractOwnedCollection*>()->genericAdd(value);
+    element.getPropertyValue(property, AccessTag::NoProxyResolve)
+        .getValue<AbstractOwnedCollection*>()
+        ->genericAdd(value);
   } else {
     element.assignValue(property, value, true);
   }

@@ -1,7 +1,7 @@
 #include "qf/zero/core/change_report.h"
 
-#include "qf/zero/core/owned_collection.h"
 #include "qf/zero/core/internal/storage.h"
+#include "qf/zero/core/owned_collection.h"
 
 namespace qf::zero {
 

@@ -13,18 +13,19 @@ namespace qf::zero {
 
 namespace {
 
-std::unique_ptr<AbstractOwnedCollection> makeCollection(ModelElement::Impl* owner, const meta::Property& property) {
+std::unique_ptr<AbstractOwnedCollection> makeCollection(ModelElement::Impl* owner,
+                                                        const meta::Property& property) {
   if (property->isReference()) {
     if (property->isSequence()) {
-      return std::make_unique<TypedReferenceCollectionWithProxies<ModelElement, std::vector<ModelElement>>>(owner,
-                                                                                                          property);
-    }
-    if (property->isMap()) {
-      return std::make_unique<TypedReferenceCollectionWithProxies<ModelElement, std::map<MapKey, ModelElement>>>(
+      return std::make_unique<TypedReferenceCollectionWithProxies<ModelElement, std::vector<ModelElement>>>(
           owner, property);
     }
-    return std::make_unique<TypedReferenceCollectionWithProxies<ModelElement, std::unordered_set<ModelElement>>>(
-        owner, property);
+    if (property->isMap()) {
+      return std::make_unique<
+          TypedReferenceCollectionWithProxies<ModelElement, std::map<MapKey, ModelElement>>>(owner, property);
+    }
+    return std::make_unique<
+        TypedReferenceCollectionWithProxies<ModelElement, std::unordered_set<ModelElement>>>(owner, property);
   }
   if (property->isSequence()) return std::make_unique<PrimitiveSequence<Value>>(owner, property);
   return std::make_unique<PrimitiveSet<Value>>(owner, property);
@@ -56,7 +57,9 @@ std::size_t DynamicElementImpl::slotOf(const meta::Property& property) const {
   return slot;
 }
 
-Value DynamicElementImpl::basicGetValue(const meta::Property& property) const { return values_[slotOf(property)]; }
+Value DynamicElementImpl::basicGetValue(const meta::Property& property) const {
+  return values_[slotOf(property)];
+}
 
 void DynamicElementImpl::basicSetValue(const meta::Property& property, const Value& value) {
   Value& slot = values_[slotOf(property)];

@@ -1,8 +1,9 @@
 #include "qf/zero/core/internal/element_impl.h"
 
 #include "core/transaction_state.h"
-#include "qf/zero/core/messages.h"
 #include "qf/zero/core/builder.h"
+#include "qf/zero/core/internal/storage.h"
+#include "qf/zero/core/messages.h"
 #include "qf/zero/core/meta/enum.h"
 #include "qf/zero/core/meta/operation.h"
 #include "qf/zero/core/meta/primitive_type.h"
@@ -11,7 +12,6 @@
 #include "qf/zero/core/primitive_collection.h"
 #include "qf/zero/core/reference_collection.h"
 #include "qf/zero/core/report_exception.h"
-#include "qf/zero/core/internal/storage.h"
 
 #include <algorithm>
 
@@ -22,8 +22,8 @@ namespace {
 const meta::Property::Impl* propertyImpl(const meta::Property& property) { return property.getImpl(); }
 
 meta::Property propertyHandle(const void* impl) {
-  return meta::Property(const_cast<ModelElement::Impl*>(static_cast<const ModelElement::Impl*>(
-      static_cast<const meta::Property::Impl*>(impl))));
+  return meta::Property(const_cast<ModelElement::Impl*>(
+      static_cast<const ModelElement::Impl*>(static_cast<const meta::Property::Impl*>(impl))));
 }
 
 }  // namespace
@@ -101,7 +101,7 @@ void ModelElement::Impl::checkAssignable(const meta::Property& property, const V
     if (!target.isLive() && !target.isProxy()) reportException(qf0::messages::CannotAddNonExistentObject());
     if (!target.getMetaClass().conformsTo(type)) {
       reportException(qf0::messages::CannotAddIncompatibleTypes(type.getQualifiedName(),
-                                                                  target.getMetaClass().getQualifiedName()));
+                                                                target.getMetaClass().getQualifiedName()));
     }
     if (!target.isProxy()) checkCompatibleModel(target.getImpl(), property);
     if (property->isContainment()) {
@@ -182,7 +182,8 @@ void ModelElement::Impl::assignValue(const meta::Property& property, const Value
   }
   const Value current = basicGetValue(property);
   if (current == value) return;
-  if (property->isSetOnce() && !initializing && !current.isEmpty() && !(current == property->getDefaultValue())) {
+  if (property->isSetOnce() && !initializing && !current.isEmpty() &&
+      !(current == property->getDefaultValue())) {
     reportException(qf0::messages::CannotSetSetOnceProperty(property.getQualifiedName()));
   }
   // Maps keyed by this property must be told of the new key before it is stored.
@@ -191,7 +192,8 @@ void ModelElement::Impl::assignValue(const meta::Property& property, const Value
     const meta::Property via = propertyHandle(viaProperty);
     if (!via->isMap() || via->getQualifiedBy() != property) return;
     auto* map = static_cast<ReferenceCollection*>(owner->basicGetCollection(via));
-    if (ModelElement holder = map->basicFindByKey(mapKeyFromValue(value)); holder && holder.getImpl() != this) {
+    if (ModelElement holder = map->basicFindByKey(mapKeyFromValue(value));
+        holder && holder.getImpl() != this) {
       reportException(qf0::messages::UniquenessConstraint());
     }
     if (std::find(keyedMaps.begin(), keyedMaps.end(), map) == keyedMaps.end()) keyedMaps.push_back(map);
@@ -230,7 +232,8 @@ void ModelElement::Impl::setSingleReference(const meta::Property& property, cons
   const meta::Property opposite = property->getOpposite();
   if (target && opposite && opposite->isMap() && !target.isProxy()) {
     auto* map = static_cast<ReferenceCollection*>(target->basicGetCollection(opposite));
-    if (ModelElement holder = map->basicFindByKey(map->keyOf(ModelElement(this))); holder && holder.getImpl() != this) {
+    if (ModelElement holder = map->basicFindByKey(map->keyOf(ModelElement(this)));
+        holder && holder.getImpl() != this) {
       reportException(qf0::messages::UniquenessConstraint());
     }
   }
@@ -279,7 +282,8 @@ bool ModelElement::Impl::recordedRemove(const meta::Property& property, const Im
   return true;
 }
 
-void ModelElement::Impl::linkTo(const meta::Property& property, const ModelElement& target, std::size_t position) {
+void ModelElement::Impl::linkTo(const meta::Property& property, const ModelElement& target,
+                                std::size_t position) {
   Impl* t = target.getImpl();
   if (!property->isMany()) {
     const ModelElement old = basicGetValue(property).getElement();
@@ -296,9 +300,10 @@ void ModelElement::Impl::linkTo(const meta::Property& property, const ModelEleme
   if (property->isContainment()) t->setContainer(this, property);
   if (opposite && !target.isProxy()) {
     if (opposite->isContainment()) detachFromContainer();
-    const bool present = opposite->isMany()
-                             ? static_cast<ReferenceCollection*>(t->basicGetCollection(opposite))->basicContains(this)
-                             : t->basicGetValue(opposite).getElement().getImpl() == this;
+    const bool present =
+        opposite->isMany()
+            ? static_cast<ReferenceCollection*>(t->basicGetCollection(opposite))->basicContains(this)
+            : t->basicGetValue(opposite).getElement().getImpl() == this;
     if (!present) t->recordedAdd(opposite, ModelElement(this), ReferenceCollection::npos);
     if (opposite->isContainment()) setContainer(t, opposite);
   }
@@ -488,7 +493,8 @@ void ModelElement::Impl::collectSubtree(std::vector<Impl*>& subtree) {
             ->basicForEach([&](const ModelElement& child) {
               if (child.isLive()) subtree.push_back(child.getImpl());
             });
-      } else if (ModelElement child = element->basicGetValue(property).getElement(); child && child.isLive()) {
+      } else if (ModelElement child = element->basicGetValue(property).getElement();
+                 child && child.isLive()) {
         subtree.push_back(child.getImpl());
       }
     }
@@ -535,9 +541,11 @@ void ModelElement::Impl::basicDetachFromModel() {
   incoming_.clear();
 }
 
-ModelElement ModelElement::Impl::createProxy(ModelImpl* model, const meta::Class& metaClass, const ProxyId& id) {
+ModelElement ModelElement::Impl::createProxy(ModelImpl* model, const meta::Class& metaClass,
+                                             const ProxyId& id) {
   if (model != nullptr) {
-    if (auto it = model->proxies_.find(id.elementId); it != model->proxies_.end()) return ModelElement(it->second);
+    if (auto it = model->proxies_.find(id.elementId); it != model->proxies_.end())
+      return ModelElement(it->second);
   }
   std::unique_ptr<ModelElement::Builder> builder = metaClass->instantiateBuilder(Model(model));
   IntrusivePtr<Impl> proxy = builder->instantiate();

@@ -1,10 +1,10 @@
 #include "qf/zero/core/model_impl.h"
 
 #include "core/transaction_state.h"
+#include "qf/zero/core/internal/storage.h"
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/meta/structured_type.h"
 #include "qf/zero/core/report_exception.h"
-#include "qf/zero/core/internal/storage.h"
 
 #include <algorithm>
 #include <exception>
@@ -40,7 +40,8 @@ Transaction TransactionFactory::beginTransaction(bool savepoint) const {
   return model_->beginTransaction(savepoint);
 }
 
-ModelImpl::ModelImpl(const Uuid& id, ModelConstellation constellation) : uuid_(id), constellation_(constellation) {}
+ModelImpl::ModelImpl(const Uuid& id, ModelConstellation constellation)
+    : uuid_(id), constellation_(constellation) {}
 
 ModelImpl::~ModelImpl() {
   // Every element outlives its model only as an invalid shell: break the references
@@ -83,7 +84,7 @@ std::vector<ModelElement> ModelImpl::getInstances(const meta::Class& metaClass,
     if (members.empty()) continue;
     const meta::Class candidate = members.begin()->second->getMetaClass();
     const bool match = mode == query::SearchClassMatchMode::ExactClass ? candidate == metaClass
-                                                                      : candidate->isSubclassOf(metaClass);
+                                                                       : candidate->isSubclassOf(metaClass);
     if (match) merged.insert(members.begin(), members.end());
   }
   std::vector<ModelElement> result;
@@ -124,7 +125,8 @@ void ModelImpl::updateTopLevel(ModelElement::Impl* element) noexcept {
 ModelElement ModelImpl::resolveProxy(const ModelElement::Impl* from, const ModelElement& proxy) {
   if (ModelElement resident = peekResolveProxy(from, proxy); resident) return resident;
   if (proxy && proxyLoader_) {
-    if (ModelElement loaded = proxyLoader_(*this, proxy->getProxyId()); loaded && !loaded.isProxy()) return loaded;
+    if (ModelElement loaded = proxyLoader_(*this, proxy->getProxyId()); loaded && !loaded.isProxy())
+      return loaded;
   }
   reportException(qf0::messages::CannotResolveProxy(proxy ? toText(proxy->getUuid()) : std::string()));
 }
@@ -238,8 +240,8 @@ void ModelImpl::cancelLevel(int level) noexcept {
   if (level == 0) {
     std::shared_ptr<ReportData> report;
     auto holders = listeners_;
-    const bool anyObserver = std::any_of(holders.begin(), holders.end(),
-                                         [](const auto& h) { return h->observesCancels(); });
+    const bool anyObserver =
+        std::any_of(holders.begin(), holders.end(), [](const auto& h) { return h->observesCancels(); });
     if (anyObserver) {
       try {
         report = buildReport(true, boost::none);
@@ -295,7 +297,8 @@ void ModelImpl::rollbackLevel(int level) noexcept {
   for (ElementRecord* record : records) {
     if (record->dead) continue;
     if (record->storageAt(level) != nullptr) record->storages.pop_back();
-    if (!record->listedLevels.empty() && record->listedLevels.back() == level) record->listedLevels.pop_back();
+    if (!record->listedLevels.empty() && record->listedLevels.back() == level)
+      record->listedLevels.pop_back();
     if (record->element->isLive()) updateTopLevel(record->element.get());
     if (record->isEmpty() && record->listedLevels.empty()) {
       record->dead = true;
@@ -346,7 +349,9 @@ void ModelImpl::commitOutermost(boost::optional<Value> result) {
     if (needsReport) {
       state.phase = TransactionState::Phase::Validating;
       report = buildReport(deep, result);
-      forEachListener(holders, [&](ListenerHolderBase& h) { if (h.validates()) h.validateOnCommit(report); });
+      forEachListener(holders, [&](ListenerHolderBase& h) {
+        if (h.validates()) h.validateOnCommit(report);
+      });
       state.phase = TransactionState::Phase::Modifying;
       bool modifies = false;
       forEachListener(holders, [&](ListenerHolderBase& h) {

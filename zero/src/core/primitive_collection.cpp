@@ -11,7 +11,8 @@ namespace {
 
 void checkIndex(std::size_t index, std::size_t size) {
   if (index >= size) {
-    reportException(qf0::messages::IndexOutOfRange(static_cast<std::int64_t>(index), static_cast<std::int64_t>(size)));
+    reportException(
+        qf0::messages::IndexOutOfRange(static_cast<std::int64_t>(index), static_cast<std::int64_t>(size)));
   }
 }
 
@@ -101,7 +102,9 @@ void PrimitiveCollection::copyValues(const std::vector<Value>& values) {
 
 bool PrimitiveCollection::sameContents(const std::vector<Value>& items) const {
   const std::vector<Value> current = getAllValues();
-  if (isUnique()) return current.size() == items.size() && std::is_permutation(current.begin(), current.end(), items.begin());
+  if (isUnique())
+    return current.size() == items.size() &&
+           std::is_permutation(current.begin(), current.end(), items.begin());
   return current == items;
 }
 

@@ -28,7 +28,9 @@ std::vector<ModelElement> AbstractQuery::evaluate() const {
 PredicateQuery::PredicateQuery(Model model, std::function<bool(const ModelElement&)> condition)
     : AbstractQuery(std::move(model)), condition_(std::move(condition)) {}
 
-bool PredicateQuery::accepts(const ModelElement& candidate) const { return !condition_ || condition_(candidate); }
+bool PredicateQuery::accepts(const ModelElement& candidate) const {
+  return !condition_ || condition_(candidate);
+}
 
 InstanceAttachment::InstanceAttachment(AbstractQuery& query, meta::Class metaClass, SearchClassMatchMode mode)
     : query_(query), metaClass_(std::move(metaClass)), mode_(mode) {

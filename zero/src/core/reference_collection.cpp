@@ -36,7 +36,8 @@ void ReferenceCollection::insert(std::size_t position, const ModelElement& eleme
   const meta::Property opposite = property_->getOpposite();
   if (opposite && opposite->isMap() && !element.isProxy()) {
     auto* map = static_cast<ReferenceCollection*>(element->basicGetCollection(opposite));
-    if (ModelElement holder = map->basicFindByKey(map->keyOf(ModelElement(owner_))); holder && holder.getImpl() != owner_) {
+    if (ModelElement holder = map->basicFindByKey(map->keyOf(ModelElement(owner_)));
+        holder && holder.getImpl() != owner_) {
       reportException(qf0::messages::UniquenessConstraint());
     }
   }
@@ -115,7 +116,8 @@ void ReferenceCollection::replaceProxy(const ModelElement& proxy, const ModelEle
 
 bool ReferenceCollection::removeProxy(const ProxyId& id) {
   for (const ModelElement& element : getAllValuesAndProxies()) {
-    if (element.isProxy() && element->getProxyId().elementId == id.elementId) return rawErase(element.getImpl());
+    if (element.isProxy() && element->getProxyId().elementId == id.elementId)
+      return rawErase(element.getImpl());
   }
   return false;
 }
@@ -123,7 +125,8 @@ bool ReferenceCollection::removeProxy(const ProxyId& id) {
 void ReferenceCollection::resolveAll() {
   for (const ModelElement& element : getAllValuesAndProxies()) {
     if (!element.isProxy()) continue;
-    if (ModelElement resident = peekResolveProxy(element); !resident.isProxy()) replaceProxy(element, resident);
+    if (ModelElement resident = peekResolveProxy(element); !resident.isProxy())
+      replaceProxy(element, resident);
   }
 }
 
@@ -168,8 +171,8 @@ std::optional<std::size_t> ReferenceCollection::basicIndexOf(const ModelElement:
 
 Value ReferenceCollection::genericAt(std::size_t index) const {
   if (index >= size()) {
-    reportException(qf0::messages::IndexOutOfRange(static_cast<std::int64_t>(index),
-                                                   static_cast<std::int64_t>(size())));
+    reportException(
+        qf0::messages::IndexOutOfRange(static_cast<std::int64_t>(index), static_cast<std::int64_t>(size())));
   }
   return Value::createElementValue(basicAt(index), property_);
 }
@@ -179,7 +182,9 @@ void ReferenceCollection::genericAdd(const Value& value) {
   add(value.getElement());
 }
 
-bool ReferenceCollection::genericRemove(const Value& value) { return value.isElement() && remove(value.getElement()); }
+bool ReferenceCollection::genericRemove(const Value& value) {
+  return value.isElement() && remove(value.getElement());
+}
 
 std::optional<std::size_t> ReferenceCollection::genericIndexOf(const Value& value) const {
   if (!value.isElement()) return std::nullopt;
@@ -193,8 +198,8 @@ void ReferenceCollection::genericInsert(std::size_t index, const Value& value) {
 
 void ReferenceCollection::genericReplace(std::size_t index, const Value& value) {
   if (index >= size()) {
-    reportException(qf0::messages::IndexOutOfRange(static_cast<std::int64_t>(index),
-                                                   static_cast<std::int64_t>(size())));
+    reportException(
+        qf0::messages::IndexOutOfRange(static_cast<std::int64_t>(index), static_cast<std::int64_t>(size())));
   }
   Transaction transaction = owner_->getModelImpl()->beginTransaction(true);
   removeAt(index);

@@ -18,79 +18,78 @@ constexpr std::uint64_t maximumExpectedCount = std::uint64_t{1} << 56;
 // (fixed version bits, counters in a few bytes). A cheap finaliser spreads every input bit over
 // the whole word, so such uuids do not pile onto the same counters.
 std::uint64_t mix(std::uint64_t x) noexcept {
-    x ^= x >> 30;
-    x *= 0xbf58476d1ce4e5b9ULL;
-    x ^= x >> 27;
-    x *= 0x94d049bb133111ebULL;
-    x ^= x >> 31;
-    return x;
+  x ^= x >> 30;
+  x *= 0xbf58476d1ce4e5b9ULL;
+  x ^= x >> 27;
+  x *= 0x94d049bb133111ebULL;
+  x ^= x >> 31;
+  return x;
 }
 
 }  // namespace
 
 SaturatedBloomFilter::SaturatedBloomFilter(std::size_t expectedCount) {
-    const std::uint64_t expected = std::min<std::uint64_t>(expectedCount, maximumExpectedCount);
-    const std::uint64_t wanted = std::max(minimumCounters, expected * countersPerMember);
-    const std::uint64_t counters = std::bit_ceil(wanted);
-    mask_ = counters - 1;
-    nibbles_.assign(counters / 2, 0);
+  const std::uint64_t expected = std::min<std::uint64_t>(expectedCount, maximumExpectedCount);
+  const std::uint64_t wanted = std::max(minimumCounters, expected * countersPerMember);
+  const std::uint64_t counters = std::bit_ceil(wanted);
+  mask_ = counters - 1;
+  nibbles_.assign(counters / 2, 0);
 }
 
 // Double hashing over the two halves of the uuid: probe i is start + i * step modulo the counter
 // count. With a power-of-two count and an odd step the probes of one uuid are all distinct.
 SaturatedBloomFilter::Probe SaturatedBloomFilter::probeOf(const boost::uuids::uuid& id) const noexcept {
-    std::uint64_t high = 0;
-    std::uint64_t low = 0;
-    static_assert(sizeof(id.data) == 2 * sizeof(std::uint64_t));
-    std::memcpy(&high, id.data, sizeof high);
-    std::memcpy(&low, id.data + sizeof high, sizeof low);
-    return Probe{mix(high ^ mix(low)), mix(low) | 1};
+  std::uint64_t high = 0;
+  std::uint64_t low = 0;
+  static_assert(sizeof(id.data) == 2 * sizeof(std::uint64_t));
+  std::memcpy(&high, id.data, sizeof high);
+  std::memcpy(&low, id.data + sizeof high, sizeof low);
+  return Probe{mix(high ^ mix(low)), mix(low) | 1};
 }
 
 std::size_t SaturatedBloomFilter::slot(const Probe& probe, unsigned i) const noexcept {
-    return static_cast<std::size_t>((probe.start + i * probe.step) & mask_);
+  return static_cast<std::size_t>((probe.start + i * probe.step) & mask_);
 }
 
 std::uint8_t SaturatedBloomFilter::counter(std::size_t index) const noexcept {
-    const std::uint8_t byte = nibbles_[index / 2];
-    return (index % 2 == 0) ? (byte & 0x0F) : (byte >> 4);
+  const std::uint8_t byte = nibbles_[index / 2];
+  return (index % 2 == 0) ? (byte & 0x0F) : (byte >> 4);
 }
 
 void SaturatedBloomFilter::setCounter(std::size_t index, std::uint8_t value) noexcept {
-    std::uint8_t& byte = nibbles_[index / 2];
-    if (index % 2 == 0)
-        byte = static_cast<std::uint8_t>((byte & 0xF0) | value);
-    else
-        byte = static_cast<std::uint8_t>((byte & 0x0F) | (value << 4));
+  std::uint8_t& byte = nibbles_[index / 2];
+  if (index % 2 == 0)
+    byte = static_cast<std::uint8_t>((byte & 0xF0) | value);
+  else
+    byte = static_cast<std::uint8_t>((byte & 0x0F) | (value << 4));
 }
 
 void SaturatedBloomFilter::add(const boost::uuids::uuid& id) {
-    const Probe probe = probeOf(id);
-    for (unsigned i = 0; i < hashCount; ++i) {
-        const std::size_t index = slot(probe, i);
-        const std::uint8_t value = counter(index);
-        if (value != saturatedValue) setCounter(index, value + 1);
-    }
+  const Probe probe = probeOf(id);
+  for (unsigned i = 0; i < hashCount; ++i) {
+    const std::size_t index = slot(probe, i);
+    const std::uint8_t value = counter(index);
+    if (value != saturatedValue) setCounter(index, value + 1);
+  }
 }
 
 bool SaturatedBloomFilter::contains(const boost::uuids::uuid& id) const {
-    const Probe probe = probeOf(id);
-    for (unsigned i = 0; i < hashCount; ++i)
-        if (counter(slot(probe, i)) == 0) return false;
-    return true;
+  const Probe probe = probeOf(id);
+  for (unsigned i = 0; i < hashCount; ++i)
+    if (counter(slot(probe, i)) == 0) return false;
+  return true;
 }
 
 void SaturatedBloomFilter::remove(const boost::uuids::uuid& id) {
-    if (!contains(id)) return;
-    const Probe probe = probeOf(id);
-    for (unsigned i = 0; i < hashCount; ++i) {
-        const std::size_t index = slot(probe, i);
-        const std::uint8_t value = counter(index);
-        if (value != saturatedValue) setCounter(index, value - 1);
-    }
+  if (!contains(id)) return;
+  const Probe probe = probeOf(id);
+  for (unsigned i = 0; i < hashCount; ++i) {
+    const std::size_t index = slot(probe, i);
+    const std::uint8_t value = counter(index);
+    if (value != saturatedValue) setCounter(index, value - 1);
+  }
 }
 
 void SaturatedBloomFilter::clear() { std::fill(nibbles_.begin(), nibbles_.end(), 0); }
 
 }  // namespace qf::zero
-

@@ -61,7 +61,8 @@ bool ModelElement::Impl::Storage::holdsSlot(int index) const {
 }
 
 bool ModelElement::Impl::Storage::holdsCollection(int index) const {
-  return static_cast<std::size_t>(index) < slots_.size() && slots_[static_cast<std::size_t>(index)].isCollection;
+  return static_cast<std::size_t>(index) < slots_.size() &&
+         slots_[static_cast<std::size_t>(index)].isCollection;
 }
 
 const Value& ModelElement::Impl::Storage::oldValue(int index) const {
@@ -93,7 +94,8 @@ void ModelElement::Impl::Storage::revertUnchanged(Impl* element) {
   }
 }
 
-void ModelElement::Impl::Storage::setOldContainer(const ModelElement& container, const meta::Property& feature) {
+void ModelElement::Impl::Storage::setOldContainer(const ModelElement& container,
+                                                  const meta::Property& feature) {
   oldContainer_ = container;
   oldFeature_ = feature;
 }

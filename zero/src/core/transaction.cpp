@@ -35,7 +35,8 @@ void Transaction::commit(boost::optional<Value> result) {
   if (!open_ || !model_->txn_) reportException(qf0::messages::TransactionNotOpen());
   // Savepoints close innermost first; committing an outer one while an inner is
   // still open would leave the inner one nothing to close.
-  if (level_ >= 0 && model_->txn_->currentLevel() != level_) reportException(qf0::messages::TransactionNotOpen());
+  if (level_ >= 0 && model_->txn_->currentLevel() != level_)
+    reportException(qf0::messages::TransactionNotOpen());
   open_ = false;
   model_->commitLevel(level_, std::move(result));
 }

@@ -25,9 +25,12 @@ const std::vector<Value>& Value::getList() const {
 
 const std::type_info& Value::heldType() const noexcept {
   switch (kind_) {
-    case Kind::Empty: return typeid(void);
-    case Kind::Element: return typeid(ModelElement);
-    case Kind::Other: break;
+    case Kind::Empty:
+      return typeid(void);
+    case Kind::Element:
+      return typeid(ModelElement);
+    case Kind::Other:
+      break;
   }
   return holder_->type();
 }
@@ -40,9 +43,12 @@ AbstractOwnedCollection* Value::collectionPointer() const noexcept {
 bool operator==(const Value& a, const Value& b) {
   if (a.kind_ != b.kind_) return false;
   switch (a.kind_) {
-    case Value::Kind::Empty: return true;
-    case Value::Kind::Element: return a.element_ == b.element_;
-    case Value::Kind::Other: break;
+    case Value::Kind::Empty:
+      return true;
+    case Value::Kind::Element:
+      return a.element_ == b.element_;
+    case Value::Kind::Other:
+      break;
   }
   return a.holder_ == b.holder_ || a.holder_->equals(*b.holder_);
 }

@@ -42,7 +42,8 @@ AttributeCodec codecFor(const meta::Type& type) {
   return codec;
 }
 
-nlohmann::ordered_json writeAttribute(const meta::Property& property, const AttributeCodec& codec, const Value& value) {
+nlohmann::ordered_json writeAttribute(const meta::Property& property, const AttributeCodec& codec,
+                                      const Value& value) {
   if (value.isEmpty()) return nullptr;
   switch (codec.kind) {
     case AttributeKind::String:

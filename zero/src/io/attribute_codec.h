@@ -35,7 +35,8 @@ struct AttributeCodec {
 AttributeCodec codecFor(const meta::Type& type);
 
 // Writes one value of `property` (one item of a many-valued one). An empty value is null.
-nlohmann::ordered_json writeAttribute(const meta::Property& property, const AttributeCodec& codec, const Value& value);
+nlohmann::ordered_json writeAttribute(const meta::Property& property, const AttributeCodec& codec,
+                                      const Value& value);
 
 // How a JSON value is named in "WrongJsonType": "a string", "null" ...
 std::string describeJson(const nlohmann::ordered_json& json);

@@ -52,7 +52,8 @@ const ordered_json& memberArray(const ordered_json& report, const char* name) {
   const auto it = report.find(name);
   if (it == report.end() || it->is_null()) return empty;
   if (!it->is_array()) {
-    reportException(qf0::messages::MalformedDocument(std::string("the member '") + name + "' is not an array"));
+    reportException(
+        qf0::messages::MalformedDocument(std::string("the member '") + name + "' is not an array"));
   }
   return *it;
 }
@@ -62,7 +63,8 @@ const ordered_json& memberArray(const ordered_json& report, const char* name) {
 void JSONChangeReportSynchronizer::applyChangeReportVerbatim(const ordered_json& report, const Model& model,
                                                              std::unique_ptr<ModelBuilder> builder,
                                                              std::unique_ptr<ParseCustomizer> customizer) {
-  if (!report.is_object()) reportException(qf0::messages::MalformedDocument("the change report is not an object"));
+  if (!report.is_object())
+    reportException(qf0::messages::MalformedDocument("the change report is not an object"));
   std::vector<const ordered_json*> entries;
   for (const char* member : {JSONConstants::ADDED_ATTR, JSONConstants::MODIFIED_ATTR}) {
     for (const ordered_json& entry : memberArray(report, member)) entries.push_back(&entry);
@@ -85,7 +87,8 @@ void JSONChangeReportSynchronizer::applyChangeReportVerbatim(const ordered_json&
   transaction.commit();
 }
 
-ordered_json JSONChangeReportSynchronizer::writeChangeReport(const ReportData& report, JSONSerializer& serializer) {
+ordered_json JSONChangeReportSynchronizer::writeChangeReport(const ReportData& report,
+                                                             JSONSerializer& serializer) {
   ordered_json added = ordered_json::array();
   ordered_json modified = ordered_json::array();
   ordered_json destroyed = ordered_json::array();

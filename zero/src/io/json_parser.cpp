@@ -8,6 +8,7 @@
 #include "qf/zero/io/json_constants.h"
 
 #include <boost/container_hash/hash.hpp>
+
 #include <nlohmann/json.hpp>
 
 #include <limits>
@@ -24,7 +25,8 @@ namespace {
 [[noreturn]] void malformed(std::string what) { reportException(msg::MalformedDocument(std::move(what))); }
 
 [[noreturn]] void wrongType(const meta::Property& property, std::string expected, const ordered_json& found) {
-  reportException(msg::WrongJsonType(property.getQualifiedName(), std::move(expected), internal::describeJson(found)));
+  reportException(
+      msg::WrongJsonType(property.getQualifiedName(), std::move(expected), internal::describeJson(found)));
 }
 
 std::string entryLabel(std::size_t index) { return "entry " + std::to_string(index); }
@@ -117,7 +119,8 @@ class JSONParser::Run {
         if (!json.is_array()) wrongType(plan.property, "an array", json);
         builder_.clearObjectValue(entry.element, plan.property);
         for (const ordered_json& item : json) {
-          builder_.setObjectValue(entry.element, plan.property, readAttribute(plan.property, plan.codec, item));
+          builder_.setObjectValue(entry.element, plan.property,
+                                  readAttribute(plan.property, plan.codec, item));
         }
       } else {
         builder_.setValue(entry.element, plan.property, readAttribute(plan.property, plan.codec, json));
@@ -125,7 +128,8 @@ class JSONParser::Run {
     }
   }
 
-  Value readAttribute(const meta::Property& property, const internal::AttributeCodec& codec, const ordered_json& json) {
+  Value readAttribute(const meta::Property& property, const internal::AttributeCodec& codec,
+                      const ordered_json& json) {
     if (json.is_null()) {
       // A JSON value of a single-valued property may be null itself; an optional one
       // reads null as absent.
@@ -141,10 +145,11 @@ class JSONParser::Run {
         return Value::createPrimitiveValue(property, json.get<bool>());
       case internal::AttributeKind::Integer: {
         if (!json.is_number_integer()) wrongType(property, "an integer", json);
-        const bool fits = json.is_number_unsigned()
-                              ? json.get<std::uint64_t>() <= static_cast<std::uint64_t>(std::numeric_limits<int>::max())
-                              : json.get<std::int64_t>() >= std::numeric_limits<int>::min() &&
-                                    json.get<std::int64_t>() <= std::numeric_limits<int>::max();
+        const bool fits =
+            json.is_number_unsigned()
+                ? json.get<std::uint64_t>() <= static_cast<std::uint64_t>(std::numeric_limits<int>::max())
+                : json.get<std::int64_t>() >= std::numeric_limits<int>::min() &&
+                      json.get<std::int64_t>() <= std::numeric_limits<int>::max();
         if (!fits) wrongType(property, "a 32-bit integer", json);
         return Value::createPrimitiveValue(property, json.get<int>());
       }
@@ -173,7 +178,8 @@ class JSONParser::Run {
     return Value();
   }
 
-  Value readDatatype(const meta::Property& property, const internal::AttributeCodec& codec, const ordered_json& json) {
+  Value readDatatype(const meta::Property& property, const internal::AttributeCodec& codec,
+                     const ordered_json& json) {
     if (!json.is_object()) wrongType(property, "an object", json);
     const auto datatype = elementCast<meta::DataType>(ModelElement(property->getType()));
     Value datum = builder_.instantiateDataType(datatype);
@@ -293,7 +299,8 @@ std::vector<ParseItem> JSONParser::parseVerbatim(const ordered_json& document, c
   return parseEntries(pointers, model);
 }
 
-std::vector<ParseItem> JSONParser::parseEntries(const std::vector<const ordered_json*>& entries, const Model& model) {
+std::vector<ParseItem> JSONParser::parseEntries(const std::vector<const ordered_json*>& entries,
+                                                const Model& model) {
   Transaction transaction = model->beginTransaction(true);
   std::vector<ParseItem> items = Run(*customizer_, *builder_, model).parse(entries);
   transaction.commit();

@@ -8,6 +8,7 @@
 #include "qf/zero/core/text.h"
 
 #include <boost/date_time/posix_time/posix_time.hpp>
+
 #include <nlohmann/json.hpp>
 
 #include <algorithm>
@@ -48,7 +49,8 @@ ordered_json writeByHeldType(const Value& value) {
 
 std::vector<ModelElement> SerializeCustomizer::getAggregateMembers(const ModelElement&) const { return {}; }
 
-std::vector<ModelElement> ContainmentAggregateCustomizer::getAggregateMembers(const ModelElement& element) const {
+std::vector<ModelElement> ContainmentAggregateCustomizer::getAggregateMembers(
+    const ModelElement& element) const {
   std::vector<ModelElement> children;
   for (const meta::Property& property : element->allProperties()) {
     if (!property->isContainment()) continue;
@@ -108,14 +110,16 @@ class JSONSerializer::EntryWriter {
     return plans_.emplace(metaClass.getImpl(), std::move(plan)).first->second;
   }
 
-  void writeProperty(const ModelElement::Impl& element, const PropertyPlan& plan, ordered_json& content) const {
+  void writeProperty(const ModelElement::Impl& element, const PropertyPlan& plan,
+                     ordered_json& content) const {
     const meta::Property& property = plan.property;
     const bool skipDefaults = customizer_.shouldSkipDefaultValues();
     if (property->isMany()) {
       AbstractOwnedCollection* collection = element.basicGetCollection(property);
       if (skipDefaults && collection->size() == 0) return;
       if (plan.reference) {
-        content[plan.name] = referencesJson(*static_cast<ReferenceCollection*>(collection), property->isSequence());
+        content[plan.name] =
+            referencesJson(*static_cast<ReferenceCollection*>(collection), property->isSequence());
         return;
       }
       ordered_json array = ordered_json::array();

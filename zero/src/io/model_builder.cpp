@@ -7,7 +7,8 @@
 
 namespace qf::zero::io {
 
-ModelElement ModelBuilder::instantiate(const Model& model, const meta::Class& metaClass, const ElementId& id) {
+ModelElement ModelBuilder::instantiate(const Model& model, const meta::Class& metaClass,
+                                       const ElementId& id) {
   return metaClass.instantiate(model, id.uuid.value_or(Uuid()));
 }
 

@@ -11,7 +11,8 @@ const std::vector<meta::Property>& ModelTraverser::getProperties(const meta::Str
   std::vector<meta::Property> selected;
   for (const meta::Property& property : type->getAllProperties()) {
     if (isPropertyTransient(property)) continue;
-    if (category == PropertyCategory::All || getPropertyCategory(property) == category) selected.push_back(property);
+    if (category == PropertyCategory::All || getPropertyCategory(property) == category)
+      selected.push_back(property);
   }
   return cache_.emplace(key, std::move(selected)).first->second;
 }
@@ -21,11 +22,14 @@ PropertyCategory ModelTraverser::getPropertyCategory(const meta::Property& prope
   return property->isComposite() ? PropertyCategory::Containment : PropertyCategory::Reference;
 }
 
-bool ModelTraverser::isPropertyTransient(const meta::Property& property) const { return property->isTransient(); }
+bool ModelTraverser::isPropertyTransient(const meta::Property& property) const {
+  return property->isTransient();
+}
 
 bool JSONModelTraverser::isPropertyTransient(const meta::Property& property) const {
   if (ModelTraverser::isPropertyTransient(property)) return true;
-  const auto* serializer = meta::PropertySerializerRegistry::getInstance().getPropertySerializer(property->getType());
+  const auto* serializer =
+      meta::PropertySerializerRegistry::getInstance().getPropertySerializer(property->getType());
   return serializer != nullptr && !serializer->isSerializable();
 }
 

@@ -1,8 +1,8 @@
 #include "qf/zero/io/parse_customizer.h"
 
+#include "qf/zero/core/messages.h"
 #include "qf/zero/core/meta/meta_registry.h"
 #include "qf/zero/core/meta/primitive_type.h"
-#include "qf/zero/core/messages.h"
 #include "qf/zero/core/report_exception.h"
 #include "qf/zero/io/json_constants.h"
 #include "qf/zero/io/model_builder.h"
@@ -17,8 +17,8 @@ bool ParseCustomizer::shallAddReference(const ModelElement&, const meta::Propert
   return true;
 }
 
-ModelElement ParseCustomizer::findReference(ModelBuilder& builder, const Model& model, const meta::Class& metaClass,
-                                            const ElementId& id) {
+ModelElement ParseCustomizer::findReference(ModelBuilder& builder, const Model& model,
+                                            const meta::Class& metaClass, const ElementId& id) {
   return builder.findReference(model, metaClass, id);
 }
 

@@ -1,9 +1,9 @@
 #pragma once
 
-#include <string>
-
 #include "foundation/core/except/catalog.h"
 #include "foundation/core/except/message.h"
+
+#include <string>
 
 // Messages of the version-control library, catalog "kiv:messages". Raise them with
 // qf::zero::reportException, e.g. reportException(kiv::messages::NoOrigin()).

@@ -20,7 +20,8 @@ AbstractMetaPackage::AbstractMetaPackage() : metaModel_(Model::create(generateNe
 
 AbstractMetaPackage::~AbstractMetaPackage() = default;
 
-Package AbstractMetaPackage::createPackage(std::u16string uri, std::u16string name, std::string_view uuidText) {
+Package AbstractMetaPackage::createPackage(std::u16string uri, std::u16string name,
+                                           std::string_view uuidText) {
   return Package::create(metaModel_, itemId(uuidText), std::move(uri), std::move(name));
 }
 
@@ -34,11 +35,13 @@ DataType AbstractMetaPackage::createDataType(std::u16string name, std::u16string
   return DataType::create(metaModel_, itemId(uuidText), std::move(name), std::move(qualifiedName));
 }
 
-Enum AbstractMetaPackage::createEnum(std::u16string name, std::u16string qualifiedName, std::string_view uuidText) {
+Enum AbstractMetaPackage::createEnum(std::u16string name, std::u16string qualifiedName,
+                                     std::string_view uuidText) {
   return Enum::create(metaModel_, itemId(uuidText), std::move(name), std::move(qualifiedName));
 }
 
-EnumLiteral AbstractMetaPackage::createEnumLiteral(std::u16string name, int value, std::string_view uuidText) {
+EnumLiteral AbstractMetaPackage::createEnumLiteral(std::u16string name, int value,
+                                                   std::string_view uuidText) {
   return EnumLiteral::create(metaModel_, itemId(uuidText), std::move(name), value);
 }
 

@@ -1,8 +1,8 @@
 #include "qf/zero/core/builder.h"
+#include "qf/zero/core/messages.h"
 #include "qf/zero/core/meta/meta_registry.h"
 #include "qf/zero/core/meta/operation.h"
 #include "qf/zero/core/meta/structured_type.h"
-#include "qf/zero/core/messages.h"
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/report_exception.h"
 
@@ -60,7 +60,8 @@ void Class::Impl::buildCaches() const {
   int highest = 0;
   for (const Property& property : allProperties_) highest = std::max(highest, property.getIndex());
   byIndex_.assign(static_cast<std::size_t>(highest) + 1, Property());
-  for (const Property& property : allProperties_) byIndex_[static_cast<std::size_t>(property.getIndex())] = property;
+  for (const Property& property : allProperties_)
+    byIndex_[static_cast<std::size_t>(property.getIndex())] = property;
   cachesBuilt_ = true;
 }
 

@@ -4,6 +4,7 @@
 #include "qf/zero/core/model.h"
 
 #include <boost/date_time/posix_time/posix_time.hpp>
+
 #include <nlohmann/json.hpp>
 
 #include <charconv>
@@ -86,21 +87,24 @@ struct FrameworkPackage {
   FrameworkPackage() {
     package = Package::create(model, id("package"), kFrameworkPackageUri, u"");
     primitive(u"String", std::make_shared<TypedTraits<std::u16string>>(std::u16string(), nullptr, nullptr));
-    primitive(u"Boolean", std::make_shared<TypedTraits<bool>>(false, parseBoolean,
-                                                             [](const bool& v) { return std::string(v ? "true" : "false"); }));
-    primitive(u"Integer", std::make_shared<TypedTraits<int>>(0, parseInteger, [](const int& v) { return std::to_string(v); }));
+    primitive(u"Boolean", std::make_shared<TypedTraits<bool>>(false, parseBoolean, [](const bool& v) {
+                return std::string(v ? "true" : "false");
+              }));
+    primitive(u"Integer", std::make_shared<TypedTraits<int>>(0, parseInteger,
+                                                             [](const int& v) { return std::to_string(v); }));
     primitive(u"UUID", std::make_shared<TypedTraits<Uuid>>(
                            Uuid{}, [](const std::string& t) { return parseUuid(t); },
                            [](const Uuid& v) { return toText(v); }));
-    primitive(u"DateTime", std::make_shared<TypedTraits<DateTime>>(
-                               DateTime(), parseDateTime,
-                               [](const DateTime& v) { return boost::posix_time::to_iso_extended_string(v); }));
-    primitive(u"JsonValue", std::make_shared<TypedTraits<JsonValue>>(JsonValue(), parseJson,
-                                                                     [](const JsonValue& v) { return v.dump(); }));
+    primitive(u"DateTime",
+              std::make_shared<TypedTraits<DateTime>>(DateTime(), parseDateTime, [](const DateTime& v) {
+                return boost::posix_time::to_iso_extended_string(v);
+              }));
+    primitive(u"JsonValue", std::make_shared<TypedTraits<JsonValue>>(
+                                JsonValue(), parseJson, [](const JsonValue& v) { return v.dump(); }));
     primitive(u"HxArray", std::make_shared<TypedTraits<HxArray>>(HxArray(), nullptr, nullptr));
-    for (const char16_t* name : {u"ModelElement", u"Model", u"NamedElement", u"Package", u"Type", u"PrimitiveType",
-                                 u"StructuredType", u"Class", u"DataType", u"Enum", u"EnumLiteral", u"TypedElement",
-                                 u"Property", u"Operation", u"Argument"}) {
+    for (const char16_t* name : {u"ModelElement", u"Model", u"NamedElement", u"Package", u"Type",
+                                 u"PrimitiveType", u"StructuredType", u"Class", u"DataType", u"Enum",
+                                 u"EnumLiteral", u"TypedElement", u"Property", u"Operation", u"Argument"}) {
       const bool isAbstract = std::u16string_view(name) != u"Model";
       Class metaClass = Class::create(model, id(toUtf8(name)), name, name, isAbstract);
       package->addType(metaClass);

@@ -1,10 +1,10 @@
 // Accessors and factories of the metamodel items.
+#include "qf/zero/core/messages.h"
 #include "qf/zero/core/meta/enum.h"
 #include "qf/zero/core/meta/framework_package.h"
 #include "qf/zero/core/meta/operation.h"
 #include "qf/zero/core/meta/package.h"
 #include "qf/zero/core/meta/structured_type.h"
-#include "qf/zero/core/messages.h"
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/report_exception.h"
 
@@ -62,7 +62,8 @@ PrimitiveType PrimitiveType::create(const Model& model, const Uuid& id, std::u16
   return make<PrimitiveType, Impl>(model, id, std::move(name), std::move(qualifiedName), std::move(traits));
 }
 
-DataType DataType::create(const Model& model, const Uuid& id, std::u16string name, std::u16string qualifiedName) {
+DataType DataType::create(const Model& model, const Uuid& id, std::u16string name,
+                          std::u16string qualifiedName) {
   return make<DataType, Impl>(model, id, std::move(name), std::move(qualifiedName));
 }
 

@@ -1,42 +1,42 @@
 #pragma once
 
-#include <string_view>
-#include <utility>
-
 #include "foundation/core/except/catalog.h"
 #include "foundation/core/except/message_argument.h"
 #include "foundation/core/except/message_id.h"
+
+#include <string_view>
+#include <utility>
 
 namespace foundation::core::except {
 
 // Base of every message class. A message class is named exactly as its catalog key and is
 // constructed from its typed arguments; see FOUNDATION_MESSAGE.
 class Message {
-public:
-    explicit Message(MessageId id) : id_(std::move(id)) {}
+ public:
+  explicit Message(MessageId id) : id_(std::move(id)) {}
 
-    const MessageId& id() const noexcept { return id_; }
+  const MessageId& id() const noexcept { return id_; }
 
-private:
-    MessageId id_;
+ private:
+  MessageId id_;
 };
 
 // Implementation of FOUNDATION_MESSAGE. Derived supplies `key` and `messageCatalog()`; it is
 // complete by the time the constructor is instantiated.
 template <class Derived, class... Params>
 class TypedMessage : public Message {
-public:
-    explicit TypedMessage(MessageParameter<Params>... args)
-        : Message(MessageId(Derived::messageCatalog(), Derived::key, collect(std::move(args)...))) {}
+ public:
+  explicit TypedMessage(MessageParameter<Params>... args)
+      : Message(MessageId(Derived::messageCatalog(), Derived::key, collect(std::move(args)...))) {}
 
-private:
-    template <class... Ps>
-    static std::vector<MessageArgument> collect(Ps&&... parameters) {
-        std::vector<MessageArgument> result;
-        result.reserve(sizeof...(Ps));
-        (result.push_back(std::move(parameters).take()), ...);
-        return result;
-    }
+ private:
+  template <class... Ps>
+  static std::vector<MessageArgument> collect(Ps&&... parameters) {
+    std::vector<MessageArgument> result;
+    result.reserve(sizeof...(Ps));
+    (result.push_back(std::move(parameters).take()), ...);
+    return result;
+  }
 };
 
 }  // namespace foundation::core::except
@@ -47,9 +47,9 @@ private:
 //
 //   FOUNDATION_MESSAGE(catalog, NoSuchType, std::u16string)
 //   FOUNDATION_MESSAGE(catalog, ModelDestroyed)
-#define FOUNDATION_MESSAGE(CatalogFunction, Key, ...)                                                  \
-    struct Key final : ::foundation::core::except::TypedMessage<Key __VA_OPT__(, ) __VA_ARGS__> {     \
-        static constexpr ::std::string_view key = #Key;                                                \
-        static const ::foundation::core::except::Catalog& messageCatalog() { return CatalogFunction(); } \
-        using ::foundation::core::except::TypedMessage<Key __VA_OPT__(, ) __VA_ARGS__>::TypedMessage;  \
-    };
+#define FOUNDATION_MESSAGE(CatalogFunction, Key, ...)                                                \
+  struct Key final : ::foundation::core::except::TypedMessage<Key __VA_OPT__(, ) __VA_ARGS__> {      \
+    static constexpr ::std::string_view key = #Key;                                                  \
+    static const ::foundation::core::except::Catalog& messageCatalog() { return CatalogFunction(); } \
+    using ::foundation::core::except::TypedMessage<Key __VA_OPT__(, ) __VA_ARGS__>::TypedMessage;    \
+  };

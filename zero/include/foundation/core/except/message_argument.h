@@ -32,80 +32,84 @@ inline MessageArgument toMessageArgument(std::string text) { return MessageArgum
 inline MessageArgument toMessageArgument(std::string_view text) { return MessageArgument(std::string(text)); }
 inline MessageArgument toMessageArgument(const char* text) { return MessageArgument(std::string(text)); }
 inline MessageArgument toMessageArgument(std::u16string text) { return MessageArgument(std::move(text)); }
-inline MessageArgument toMessageArgument(std::u16string_view text) { return MessageArgument(std::u16string(text)); }
-inline MessageArgument toMessageArgument(const char16_t* text) { return MessageArgument(std::u16string(text)); }
+inline MessageArgument toMessageArgument(std::u16string_view text) {
+  return MessageArgument(std::u16string(text));
+}
+inline MessageArgument toMessageArgument(const char16_t* text) {
+  return MessageArgument(std::u16string(text));
+}
 
 // An unsigned value beyond int64 cannot be held as a number; its decimal text is kept instead
 // so the message still shows the exact value.
 template <MessageInteger T>
 MessageArgument toMessageArgument(T value) {
-    if constexpr (std::is_unsigned_v<T>) {
-        if (value > static_cast<std::make_unsigned_t<std::int64_t>>(std::numeric_limits<std::int64_t>::max()))
-            return MessageArgument(std::to_string(value));
-    }
-    return MessageArgument(static_cast<std::int64_t>(value));
+  if constexpr (std::is_unsigned_v<T>) {
+    if (value > static_cast<std::make_unsigned_t<std::int64_t>>(std::numeric_limits<std::int64_t>::max()))
+      return MessageArgument(std::to_string(value));
+  }
+  return MessageArgument(static_cast<std::int64_t>(value));
 }
 
 template <class... Args>
 std::vector<MessageArgument> makeArguments(Args&&... args) {
-    std::vector<MessageArgument> result;
-    result.reserve(sizeof...(Args));
-    (result.push_back(toMessageArgument(std::forward<Args>(args))), ...);
-    return result;
+  std::vector<MessageArgument> result;
+  result.reserve(sizeof...(Args));
+  (result.push_back(toMessageArgument(std::forward<Args>(args))), ...);
+  return result;
 }
 
 // Constructor parameter types of message classes. Each accepts every spelling of its kind of
 // value implicitly (literal, owning string, view, any integral type) and nothing else, so a
 // message declared to take UTF-16 text rejects narrow text at compile time.
 class WideTextParameter {
-public:
-    WideTextParameter(const char16_t* text) : value_(std::u16string(text)) {}
-    WideTextParameter(std::u16string text) : value_(std::move(text)) {}
-    WideTextParameter(std::u16string_view text) : value_(std::u16string(text)) {}
-    MessageArgument take() && { return std::move(value_); }
+ public:
+  WideTextParameter(const char16_t* text) : value_(std::u16string(text)) {}
+  WideTextParameter(std::u16string text) : value_(std::move(text)) {}
+  WideTextParameter(std::u16string_view text) : value_(std::u16string(text)) {}
+  MessageArgument take() && { return std::move(value_); }
 
-private:
-    MessageArgument value_;
+ private:
+  MessageArgument value_;
 };
 
 class NarrowTextParameter {
-public:
-    NarrowTextParameter(const char* text) : value_(std::string(text)) {}
-    NarrowTextParameter(std::string text) : value_(std::move(text)) {}
-    NarrowTextParameter(std::string_view text) : value_(std::string(text)) {}
-    MessageArgument take() && { return std::move(value_); }
+ public:
+  NarrowTextParameter(const char* text) : value_(std::string(text)) {}
+  NarrowTextParameter(std::string text) : value_(std::move(text)) {}
+  NarrowTextParameter(std::string_view text) : value_(std::string(text)) {}
+  MessageArgument take() && { return std::move(value_); }
 
-private:
-    MessageArgument value_;
+ private:
+  MessageArgument value_;
 };
 
 class IntegerParameter {
-public:
-    template <MessageInteger T>
-    IntegerParameter(T value) : value_(toMessageArgument(value)) {}
-    MessageArgument take() && { return std::move(value_); }
+ public:
+  template <MessageInteger T>
+  IntegerParameter(T value) : value_(toMessageArgument(value)) {}
+  MessageArgument take() && { return std::move(value_); }
 
-private:
-    MessageArgument value_;
+ private:
+  MessageArgument value_;
 };
 
 // For arguments that may be narrow or wide, e.g. a type name that is UTF-16 when it comes from
 // a metamodel and narrow when it comes from C++.
 class AnyParameter {
-public:
-    AnyParameter(MessageArgument value) : value_(std::move(value)) {}
-    AnyParameter(const char* text) : value_(std::string(text)) {}
-    AnyParameter(std::string text) : value_(std::move(text)) {}
-    AnyParameter(std::string_view text) : value_(std::string(text)) {}
-    AnyParameter(const char16_t* text) : value_(std::u16string(text)) {}
-    AnyParameter(std::u16string text) : value_(std::move(text)) {}
-    AnyParameter(std::u16string_view text) : value_(std::u16string(text)) {}
-    template <MessageInteger T>
-    AnyParameter(T value) : value_(toMessageArgument(value)) {}
-    MessageArgument take() && { return std::move(value_); }
+ public:
+  AnyParameter(MessageArgument value) : value_(std::move(value)) {}
+  AnyParameter(const char* text) : value_(std::string(text)) {}
+  AnyParameter(std::string text) : value_(std::move(text)) {}
+  AnyParameter(std::string_view text) : value_(std::string(text)) {}
+  AnyParameter(const char16_t* text) : value_(std::u16string(text)) {}
+  AnyParameter(std::u16string text) : value_(std::move(text)) {}
+  AnyParameter(std::u16string_view text) : value_(std::u16string(text)) {}
+  template <MessageInteger T>
+  AnyParameter(T value) : value_(toMessageArgument(value)) {}
+  MessageArgument take() && { return std::move(value_); }
 
-private:
-    MessageArgument value_;
+ private:
+  MessageArgument value_;
 };
 
 namespace detail {
@@ -113,19 +117,19 @@ template <class T>
 struct ParameterFor;
 template <>
 struct ParameterFor<std::u16string> {
-    using type = WideTextParameter;
+  using type = WideTextParameter;
 };
 template <>
 struct ParameterFor<std::string> {
-    using type = NarrowTextParameter;
+  using type = NarrowTextParameter;
 };
 template <>
 struct ParameterFor<std::int64_t> {
-    using type = IntegerParameter;
+  using type = IntegerParameter;
 };
 template <>
 struct ParameterFor<MessageArgument> {
-    using type = AnyParameter;
+  using type = AnyParameter;
 };
 }  // namespace detail
 

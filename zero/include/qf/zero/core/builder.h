@@ -23,7 +23,9 @@ class ModelElement::Builder {
  public:
   class Orchestrator;
 
-  Builder(Model model, int count) : model_(std::move(model)) { entries_.reserve(static_cast<std::size_t>(count)); }
+  Builder(Model model, int count) : model_(std::move(model)) {
+    entries_.reserve(static_cast<std::size_t>(count));
+  }
   explicit Builder(int count) : Builder(Model(), count) {}
   virtual ~Builder() = default;
   Builder(const Builder&) = delete;

@@ -65,9 +65,15 @@ class ShallowChangeReport : public ReportData {
       E element = elementCast<E>(entry.element);
       if (!element) continue;
       switch (entry.kind) {
-        case Kind::Added: added_.push_back(element); break;
-        case Kind::Modified: modified_.push_back(element); break;
-        case Kind::Destroyed: destroyed_.push_back(element); break;
+        case Kind::Added:
+          added_.push_back(element);
+          break;
+        case Kind::Modified:
+          modified_.push_back(element);
+          break;
+        case Kind::Destroyed:
+          destroyed_.push_back(element);
+          break;
       }
     }
   }

@@ -4,7 +4,8 @@
 // taking the report as a shared pointer:
 //
 //   struct Audit : qf::zero::Listener {
-//     void transactionCommitted(const std::shared_ptr<qf::zero::ShallowChangeReport<qf::zero::ModelElement>>& r);
+//     void transactionCommitted(const std::shared_ptr<qf::zero::ShallowChangeReport<qf::zero::ModelElement>>&
+//     r);
 //   };
 //   model->addShallowListener(&audit);
 //
@@ -93,12 +94,16 @@ class ListenerHolder final : public ListenerHolderBase {
   }
 
  private:
-  static constexpr bool kValidates = requires(T& t, const ReportPtr& r) { t.validateOnCommit(r); };
-  static constexpr bool kModifies = requires(T& t, const ReportPtr& r) { t.modifyOnCommit(r); };
-  static constexpr bool kObservesCommits = requires(T& t, const ReportPtr& r) { t.transactionCommitted(r); };
-  static constexpr bool kObservesCancels = requires(T& t, const ReportPtr& r) { t.transactionCanceled(true, r); };
+  static constexpr bool kValidates = requires(T & t, const ReportPtr& r) { t.validateOnCommit(r); };
+  static constexpr bool kModifies = requires(T & t, const ReportPtr& r) { t.modifyOnCommit(r); };
+  static constexpr bool kObservesCommits = requires(T & t, const ReportPtr& r) { t.transactionCommitted(r); };
+  static constexpr bool kObservesCancels = requires(T & t, const ReportPtr& r) {
+    t.transactionCanceled(true, r);
+  };
 
-  static ReportPtr cast(const std::shared_ptr<ReportData>& report) { return std::static_pointer_cast<Report>(report); }
+  static ReportPtr cast(const std::shared_ptr<ReportData>& report) {
+    return std::static_pointer_cast<Report>(report);
+  }
 
   T* typed_;
 };

@@ -76,5 +76,7 @@ class Model::Thawer {
 
 template <>
 struct std::hash<qf::zero::Model> {
-  std::size_t operator()(const qf::zero::Model& m) const noexcept { return std::hash<const void*>()(m.getImpl()); }
+  std::size_t operator()(const qf::zero::Model& m) const noexcept {
+    return std::hash<const void*>()(m.getImpl());
+  }
 };

@@ -79,18 +79,18 @@ class ModelElement {
 //
 // The accessors are templates so that a header declaring a handle does not need the
 // complete Impl: only code that reaches into the implementation does.
-#define QF_ZERO_HANDLE(Name, Base)                                                 \
- public:                                                                           \
-  class Impl;                                                                      \
-  Name() noexcept = default;                                                       \
-  explicit Name(::qf::zero::ModelElement::Impl* impl) noexcept : Base(impl) {}     \
-  template <class ImplT = Impl>                                                    \
-  ImplT* operator->() const noexcept {                                             \
-    return this->template as<ImplT>();                                             \
-  }                                                                                \
-  template <class ImplT = Impl>                                                    \
-  ImplT* getImpl() const noexcept {                                                \
-    return this->template as<ImplT>();                                             \
+#define QF_ZERO_HANDLE(Name, Base)                                             \
+ public:                                                                       \
+  class Impl;                                                                  \
+  Name() noexcept = default;                                                   \
+  explicit Name(::qf::zero::ModelElement::Impl* impl) noexcept : Base(impl) {} \
+  template <class ImplT = Impl>                                                \
+  ImplT* operator->() const noexcept {                                         \
+    return this->template as<ImplT>();                                         \
+  }                                                                            \
+  template <class ImplT = Impl>                                                \
+  ImplT* getImpl() const noexcept {                                            \
+    return this->template as<ImplT>();                                         \
   }
 
 // The typed handle T of `element`, or a null T when the element is not of T's class.

@@ -27,7 +27,6 @@ enum class FindElementBehavior {
   IncludeProxies  // also a proxy the model made for the UUID
 };
 
-
 // Opens transactions on one model; what the library uses on a user model.
 class TransactionFactory {
  public:
@@ -59,12 +58,14 @@ class ModelImpl final : public RefCounted {
   TransactionFactory getDefaultTransactionFactory();
 
   // Elements.
-  ModelElement findElement(const Uuid& id, FindElementBehavior behavior = FindElementBehavior::LiveOnly) const;
+  ModelElement findElement(const Uuid& id,
+                           FindElementBehavior behavior = FindElementBehavior::LiveOnly) const;
   // Live elements without a container, in creation order.
   std::vector<ModelElement> getTopLevelElements() const;
   std::size_t getElementCount() const noexcept { return elements_.size(); }
   // Live instances of `metaClass` (and of its subclasses on request), in creation order.
-  std::vector<ModelElement> getInstances(const meta::Class& metaClass, query::SearchClassMatchMode mode) const;
+  std::vector<ModelElement> getInstances(const meta::Class& metaClass,
+                                         query::SearchClassMatchMode mode) const;
 
   // Proxies. resolveProxy returns the resident element for a proxy, loading it through
   // the proxy loader when one is set; raises "CannotResolveProxy" when neither works.

@@ -5,8 +5,8 @@
 // part in change reports and rollback like single values.
 #pragma once
 
-#include "qf/zero/core/internal/element_impl.h"
 #include "qf/zero/core/generic_collection.h"
+#include "qf/zero/core/internal/element_impl.h"
 #include "qf/zero/core/meta/property.h"
 #include "qf/zero/core/transaction.h"
 #include "qf/zero/core/value.h"

@@ -49,7 +49,9 @@ class PrimitiveCollectionOf : public PrimitiveCollection {
   bool isUnique() const noexcept override { return Unique; }
   const std::vector<T>& values() const noexcept { return items_; }
   const T& at(std::size_t index) const { return items_.at(index); }
-  bool contains(const T& value) const { return std::find(items_.begin(), items_.end(), value) != items_.end(); }
+  bool contains(const T& value) const {
+    return std::find(items_.begin(), items_.end(), value) != items_.end();
+  }
 
   // Checked and recorded. For a set, inserting a value it holds does nothing.
   void push_back(const T& value) { genericInsert(items_.size(), toValue(value)); }
@@ -70,9 +72,12 @@ class PrimitiveCollectionOf : public PrimitiveCollection {
 
  protected:
   void basicInsertValue(std::size_t index, const Value& value) override {
-    items_.insert(items_.begin() + static_cast<std::ptrdiff_t>(std::min(index, items_.size())), fromValue(value));
+    items_.insert(items_.begin() + static_cast<std::ptrdiff_t>(std::min(index, items_.size())),
+                  fromValue(value));
   }
-  void basicEraseAt(std::size_t index) override { items_.erase(items_.begin() + static_cast<std::ptrdiff_t>(index)); }
+  void basicEraseAt(std::size_t index) override {
+    items_.erase(items_.begin() + static_cast<std::ptrdiff_t>(index));
+  }
   void basicClearValues() override { items_.clear(); }
 
  private:

@@ -63,5 +63,7 @@ class IntrusivePtr {
 
 template <class T>
 struct std::hash<qf::zero::IntrusivePtr<T>> {
-  std::size_t operator()(const qf::zero::IntrusivePtr<T>& p) const noexcept { return std::hash<T*>()(p.get()); }
+  std::size_t operator()(const qf::zero::IntrusivePtr<T>& p) const noexcept {
+    return std::hash<T*>()(p.get());
+  }
 };

@@ -18,7 +18,9 @@
 
 namespace qf::zero {
 
-class ReferenceCollection : public AbstractOwnedCollection, public GenericSequenceInterface, public GenericMapInterface {
+class ReferenceCollection : public AbstractOwnedCollection,
+                            public GenericSequenceInterface,
+                            public GenericMapInterface {
  public:
   using AbstractOwnedCollection::AbstractOwnedCollection;
   static constexpr std::size_t npos = static_cast<std::size_t>(-1);
@@ -108,7 +110,8 @@ struct ReferenceStore<T, std::vector<T>> {
 
   bool contains(const ModelElement::Impl* e) const { return counts.count(e) != 0; }
   bool insert(std::size_t position, const T& e, const MapKey&) {
-    items.insert(position >= items.size() ? items.end() : items.begin() + static_cast<std::ptrdiff_t>(position), e);
+    items.insert(
+        position >= items.size() ? items.end() : items.begin() + static_cast<std::ptrdiff_t>(position), e);
     ++counts[e.getImpl()];
     return true;
   }
@@ -179,8 +182,12 @@ struct ReferenceStore<T, std::map<K, T>> {
   // `key` is the item's current key, where it is normally stored: looked up first, then
   // the whole map is searched, for an item stored under another key (a proxy, or an item
   // whose key changed while it was held raw).
-  bool contains(const ModelElement::Impl* e, const MapKey& key) const { return locate(e, key) != items.end(); }
-  bool insert(std::size_t, const T& e, const MapKey& key) { return items.emplace(mapKeyAs<K>(key), e).second; }
+  bool contains(const ModelElement::Impl* e, const MapKey& key) const {
+    return locate(e, key) != items.end();
+  }
+  bool insert(std::size_t, const T& e, const MapKey& key) {
+    return items.emplace(mapKeyAs<K>(key), e).second;
+  }
   bool erase(const ModelElement::Impl* e, const MapKey& key) {
     auto it = locate(e, key);
     if (it == items.end()) return false;

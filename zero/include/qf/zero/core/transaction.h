@@ -48,7 +48,7 @@ class Transaction {
   Transaction(ModelImpl* model, int level, std::uint64_t changeMark = 0) noexcept;
 
   IntrusivePtr<ModelImpl> model_;
-  int level_ = -1;  // savepoint level, or -1 when joined without one
+  int level_ = -1;                // savepoint level, or -1 when joined without one
   std::uint64_t changeMark_ = 0;  // the model's change count when a joined transaction began
   bool open_ = false;
 };

@@ -25,8 +25,8 @@
 #pragma once
 
 #include "qf/zero/core/internal/element_impl.h"
-#include "qf/zero/core/meta/property.h"
 #include "qf/zero/core/messages.h"
+#include "qf/zero/core/meta/property.h"
 #include "qf/zero/core/model_element.h"
 #include "qf/zero/core/report_exception.h"
 #include "qf/zero/core/text.h"

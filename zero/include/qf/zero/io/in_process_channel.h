@@ -1,11 +1,11 @@
 #pragma once
 
+#include "qf/zero/io/synchronization_channel.h"
+
 #include <cstddef>
 #include <memory>
 #include <string>
 #include <utility>
-
-#include "qf/zero/io/synchronization_channel.h"
 
 namespace qf::zero::io {
 
@@ -15,27 +15,27 @@ namespace qf::zero::io {
 // (whose onClosed fires with "closed by the peer"). Local close() drops what was not yet
 // delivered to this end.
 class InProcessChannel final : public SynchronizationChannel {
-public:
-    using Pair = std::pair<std::shared_ptr<SynchronizationChannel>, std::shared_ptr<SynchronizationChannel>>;
+ public:
+  using Pair = std::pair<std::shared_ptr<SynchronizationChannel>, std::shared_ptr<SynchronizationChannel>>;
 
-    static Pair createPair();
+  static Pair createPair();
 
-    ~InProcessChannel() override;
+  ~InProcessChannel() override;
 
-    void start(MessageHandler onMessage, ClosedHandler onClosed) override;
-    void send(std::string message) override;
-    void close() override;
-    bool isOpen() const override;
-    std::size_t maxMessageSize() const override;
-    void setMaxMessageSize(std::size_t bytes) override;
+  void start(MessageHandler onMessage, ClosedHandler onClosed) override;
+  void send(std::string message) override;
+  void close() override;
+  bool isOpen() const override;
+  std::size_t maxMessageSize() const override;
+  void setMaxMessageSize(std::size_t bytes) override;
 
-private:
-    struct Link;  // shared by both ends and their threads
-    struct End;   // one end's side of the link and its receiving thread
+ private:
+  struct Link;  // shared by both ends and their threads
+  struct End;   // one end's side of the link and its receiving thread
 
-    explicit InProcessChannel(std::shared_ptr<End> end);
+  explicit InProcessChannel(std::shared_ptr<End> end);
 
-    std::shared_ptr<End> end_;
+  std::shared_ptr<End> end_;
 };
 
 }  // namespace qf::zero::io

@@ -52,7 +52,8 @@ class JSONParser {
   std::vector<ParseItem> parseVerbatim(const nlohmann::ordered_json& document, const Model& model);
 
   // The same for bare entries, without a document around them.
-  std::vector<ParseItem> parseEntries(const std::vector<const nlohmann::ordered_json*>& entries, const Model& model);
+  std::vector<ParseItem> parseEntries(const std::vector<const nlohmann::ordered_json*>& entries,
+                                      const Model& model);
 
  private:
   class Run;

@@ -1,27 +1,27 @@
 #pragma once
 
+#include "qf/zero/io/json_packet.h"
+#include "qf/zero/io/synchronization_channel.h"
+
+#include <boost/optional.hpp>
+
 #include <chrono>
 #include <functional>
 #include <memory>
 #include <string>
 
-#include <boost/optional.hpp>
-
-#include "qf/zero/io/json_packet.h"
-#include "qf/zero/io/synchronization_channel.h"
-
 namespace qf::zero::io {
 
 // Where a packet handler runs.
 enum class PacketPromiseMode {
-    // On the channel's receiving thread: cheapest, but the handler holds up every packet behind
-    // it, replies included. So such a handler cannot wait for a reply: the reply could only
-    // arrive on the thread it blocks. sendAndExpectPacket called there raises ExchangeFailed at
-    // once rather than wait forever.
-    OnReceivingThread,
-    // On the transport's worker thread, one packet at a time in arrival order. The handler may
-    // call sendAndExpectPacket on this same transport: replies keep arriving meanwhile.
-    OnWorkerThread,
+  // On the channel's receiving thread: cheapest, but the handler holds up every packet behind
+  // it, replies included. So such a handler cannot wait for a reply: the reply could only
+  // arrive on the thread it blocks. sendAndExpectPacket called there raises ExchangeFailed at
+  // once rather than wait forever.
+  OnReceivingThread,
+  // On the transport's worker thread, one packet at a time in arrival order. The handler may
+  // call sendAndExpectPacket on this same transport: replies keep arriving meanwhile.
+  OnWorkerThread,
 };
 
 // Request/reply exchanges of JSONPackets over a SynchronizationChannel (see PacketCodec for the
@@ -42,52 +42,52 @@ enum class PacketPromiseMode {
 // OnReceivingThread handlers. The transport shares ownership of the channel; destroying the
 // transport closes it.
 class PacketTransport {
-public:
-    using PacketHandler = std::function<boost::optional<JSONPacket>(const JSONPacket& packet)>;
+ public:
+  using PacketHandler = std::function<boost::optional<JSONPacket>(const JSONPacket& packet)>;
 
-    static constexpr const char* errorPacketType = "Error";
+  static constexpr const char* errorPacketType = "Error";
 
-    // Starts the channel. Raises CannotCreateTransportWithoutChannel for a null channel.
-    // REQUIRES: channel not started.
-    explicit PacketTransport(std::shared_ptr<SynchronizationChannel> channel);
+  // Starts the channel. Raises CannotCreateTransportWithoutChannel for a null channel.
+  // REQUIRES: channel not started.
+  explicit PacketTransport(std::shared_ptr<SynchronizationChannel> channel);
 
-    // close(), then releases the channel.
-    ~PacketTransport();
+  // close(), then releases the channel.
+  ~PacketTransport();
 
-    PacketTransport(const PacketTransport&) = delete;
-    PacketTransport& operator=(const PacketTransport&) = delete;
+  PacketTransport(const PacketTransport&) = delete;
+  PacketTransport& operator=(const PacketTransport&) = delete;
 
-    // Sends without waiting for anything. Raises ChannelClosed once closed, PacketTooLarge when
-    // over the channel's limit, MalformedPacket when the packet holds text that is not UTF-8.
-    void sendPacket(const JSONPacket& packet);
+  // Sends without waiting for anything. Raises ChannelClosed once closed, PacketTooLarge when
+  // over the channel's limit, MalformedPacket when the packet holds text that is not UTF-8.
+  void sendPacket(const JSONPacket& packet);
 
-    // Sends request and blocks until its reply arrives, which is returned whatever its type: the
-    // caller compares it with what it expected (an "Error" reply reports a failure on the peer).
-    // expectedType only names the awaited reply in errors. Raises ExchangeFailed when the channel
-    // closes, or is closed, before the reply arrives, or when called on the receiving thread (from
-    // an OnReceivingThread handler), and PacketTooLarge or MalformedPacket as
-    // sendPacket does (nothing was sent then). Without a timeout it waits as long as the
-    // connection lasts; with one, it raises ExchangeFailed once the timeout has passed.
-    JSONPacket sendAndExpectPacket(const JSONPacket& request, const std::string& expectedType);
-    JSONPacket sendAndExpectPacket(const JSONPacket& request, const std::string& expectedType,
-                                   std::chrono::milliseconds timeout);
+  // Sends request and blocks until its reply arrives, which is returned whatever its type: the
+  // caller compares it with what it expected (an "Error" reply reports a failure on the peer).
+  // expectedType only names the awaited reply in errors. Raises ExchangeFailed when the channel
+  // closes, or is closed, before the reply arrives, or when called on the receiving thread (from
+  // an OnReceivingThread handler), and PacketTooLarge or MalformedPacket as
+  // sendPacket does (nothing was sent then). Without a timeout it waits as long as the
+  // connection lasts; with one, it raises ExchangeFailed once the timeout has passed.
+  JSONPacket sendAndExpectPacket(const JSONPacket& request, const std::string& expectedType);
+  JSONPacket sendAndExpectPacket(const JSONPacket& request, const std::string& expectedType,
+                                 std::chrono::milliseconds timeout);
 
-    // Runs handler for each incoming request of this type, in the given mode; a returned packet is
-    // sent back as the reply, none sends nothing (for packets sent with sendPacket). Replaces the
-    // handler of that type, if any, from the next packet on.
-    void setPacketHandler(std::string type, PacketHandler handler,
-                          PacketPromiseMode mode = PacketPromiseMode::OnReceivingThread);
+  // Runs handler for each incoming request of this type, in the given mode; a returned packet is
+  // sent back as the reply, none sends nothing (for packets sent with sendPacket). Replaces the
+  // handler of that type, if any, from the next packet on.
+  void setPacketHandler(std::string type, PacketHandler handler,
+                        PacketPromiseMode mode = PacketPromiseMode::OnReceivingThread);
 
-    // Closes the channel, fails exchanges in flight with ExchangeFailed, drops packets still
-    // queued for the worker and waits for the worker thread (unless called from a handler).
-    // Idempotent.
-    void close();
+  // Closes the channel, fails exchanges in flight with ExchangeFailed, drops packets still
+  // queued for the worker and waits for the worker thread (unless called from a handler).
+  // Idempotent.
+  void close();
 
-    bool isOpen() const;
+  bool isOpen() const;
 
-private:
-    class Impl;  // shared with the channel's callbacks and the worker thread
-    std::shared_ptr<Impl> impl_;
+ private:
+  class Impl;  // shared with the channel's callbacks and the worker thread
+  std::shared_ptr<Impl> impl_;
 };
 
 }  // namespace qf::zero::io

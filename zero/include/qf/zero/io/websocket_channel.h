@@ -1,12 +1,12 @@
 #pragma once
 
+#include "qf/zero/io/synchronization_channel.h"
+
 #include <cstddef>
 #include <cstdint>
 #include <functional>
 #include <memory>
 #include <string>
-
-#include "qf/zero/io/synchronization_channel.h"
 
 namespace qf::zero::io {
 
@@ -23,26 +23,26 @@ class WebSocketConnection;
 // that disappears without one (process killed, connection reset) closes this end with a reason
 // starting "connection lost".
 class WebSocketChannel final : public SynchronizationChannel {
-public:
-    // Connects to ws://host:port<target> and completes the opening handshake, waiting at most
-    // ten seconds. Raises ConnectionFailed naming the endpoint and the cause.
-    // REQUIRES: target starts with '/'.
-    static std::shared_ptr<SynchronizationChannel> connect(const std::string& host, std::uint16_t port,
-                                                           const std::string& target = "/");
+ public:
+  // Connects to ws://host:port<target> and completes the opening handshake, waiting at most
+  // ten seconds. Raises ConnectionFailed naming the endpoint and the cause.
+  // REQUIRES: target starts with '/'.
+  static std::shared_ptr<SynchronizationChannel> connect(const std::string& host, std::uint16_t port,
+                                                         const std::string& target = "/");
 
-    // Made by connect() and WebSocketListener only: nothing else can make a connection.
-    explicit WebSocketChannel(std::shared_ptr<WebSocketConnection> connection);
-    ~WebSocketChannel() override;
+  // Made by connect() and WebSocketListener only: nothing else can make a connection.
+  explicit WebSocketChannel(std::shared_ptr<WebSocketConnection> connection);
+  ~WebSocketChannel() override;
 
-    void start(MessageHandler onMessage, ClosedHandler onClosed) override;
-    void send(std::string message) override;
-    void close() override;
-    bool isOpen() const override;
-    std::size_t maxMessageSize() const override;
-    void setMaxMessageSize(std::size_t bytes) override;
+  void start(MessageHandler onMessage, ClosedHandler onClosed) override;
+  void send(std::string message) override;
+  void close() override;
+  bool isOpen() const override;
+  std::size_t maxMessageSize() const override;
+  void setMaxMessageSize(std::size_t bytes) override;
 
-private:
-    std::shared_ptr<WebSocketConnection> connection_;
+ private:
+  std::shared_ptr<WebSocketConnection> connection_;
 };
 
 // Accepts WebSocket connections on one TCP address and hands each to onAccept, after its opening
@@ -53,26 +53,26 @@ private:
 // from onAccept is dropped along with the channel. Destroying or closing the listener stops
 // accepting and drops peers still in their handshake; channels already handed over stay open.
 class WebSocketListener {
-public:
-    using AcceptHandler = std::function<void(std::shared_ptr<SynchronizationChannel> channel)>;
+ public:
+  using AcceptHandler = std::function<void(std::shared_ptr<SynchronizationChannel> channel)>;
 
-    // Listens on address ("127.0.0.1", "::", "localhost", ...) and port; port 0 picks a free one
-    // (see getPort()). Raises ListenFailed when the address cannot be listened on.
-    WebSocketListener(const std::string& address, std::uint16_t port, AcceptHandler onAccept);
-    ~WebSocketListener();
-    WebSocketListener(const WebSocketListener&) = delete;
-    WebSocketListener& operator=(const WebSocketListener&) = delete;
+  // Listens on address ("127.0.0.1", "::", "localhost", ...) and port; port 0 picks a free one
+  // (see getPort()). Raises ListenFailed when the address cannot be listened on.
+  WebSocketListener(const std::string& address, std::uint16_t port, AcceptHandler onAccept);
+  ~WebSocketListener();
+  WebSocketListener(const WebSocketListener&) = delete;
+  WebSocketListener& operator=(const WebSocketListener&) = delete;
 
-    // The port actually listened on.
-    std::uint16_t getPort() const noexcept;
+  // The port actually listened on.
+  std::uint16_t getPort() const noexcept;
 
-    // Stops accepting. Idempotent; from any thread but inside onAccept it returns after the
-    // listener's thread has ended.
-    void close();
+  // Stops accepting. Idempotent; from any thread but inside onAccept it returns after the
+  // listener's thread has ended.
+  void close();
 
-private:
-    class Acceptor;  // the socket and thread, shared with that thread; defined in the source
-    std::shared_ptr<Acceptor> acceptor_;
+ private:
+  class Acceptor;  // the socket and thread, shared with that thread; defined in the source
+  std::shared_ptr<Acceptor> acceptor_;
 };
 
 }  // namespace qf::zero::io

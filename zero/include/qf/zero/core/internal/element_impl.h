@@ -155,7 +155,8 @@ class ModelElement::Impl : public RefCounted {
   ModelElement residentOf(const ModelElement& target) const;
   // Moves this element's entry in the incoming index from `oldTarget` to `newTarget`
   // (either may be null): the bookkeeping of a raw store to a non-containment reference.
-  void relinkIncoming(const ModelElement& oldTarget, const ModelElement& newTarget, const meta::Property& property);
+  void relinkIncoming(const ModelElement& oldTarget, const ModelElement& newTarget,
+                      const meta::Property& property);
 
   // Registers a detached element in `model` under `id` (nil: a fresh UUID), inside the
   // model's open transaction or one of its own.
@@ -192,7 +193,7 @@ class ModelElement::Impl : public RefCounted {
   Uuid uuid_{};
   ModelImpl* model_ = nullptr;
   Impl* container_ = nullptr;
-  const void* containmentFeature_ = nullptr;  // meta::Property::Impl*
+  const void* containmentFeature_ = nullptr;   // meta::Property::Impl*
   internal::ElementRecord* record_ = nullptr;  // while the model's transaction touches it
   std::uint64_t serial_ = 0;
   State state_ = State::Detached;

@@ -40,7 +40,8 @@ class AbstractMetaPackage {
   // `uuidText` is the item's canonical UUID text; a malformed text is a programming
   // error of the generator and raises "InvalidValue".
   Package createPackage(std::u16string uri, std::u16string name, std::string_view uuidText);
-  Class createClass(std::u16string name, std::u16string qualifiedName, bool isAbstract, std::string_view uuidText);
+  Class createClass(std::u16string name, std::u16string qualifiedName, bool isAbstract,
+                    std::string_view uuidText);
   DataType createDataType(std::u16string name, std::u16string qualifiedName, std::string_view uuidText);
   Enum createEnum(std::u16string name, std::u16string qualifiedName, std::string_view uuidText);
   EnumLiteral createEnumLiteral(std::u16string name, int value, std::string_view uuidText);

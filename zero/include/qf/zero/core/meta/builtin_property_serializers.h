@@ -1,8 +1,10 @@
 // The ready-made property serializers: enumerations written as literal names, and
 // in-memory values that have no persistent form.
 //
-//   registry.registerPropertySerializer(colourEnum, std::make_unique<DefaultPropertySerializer<Colour>>(colourEnum));
-//   registry.registerPropertySerializer(handleType, std::make_unique<TransientOnlyPropertySerializer<Handle>>());
+//   registry.registerPropertySerializer(colourEnum,
+//   std::make_unique<DefaultPropertySerializer<Colour>>(colourEnum));
+//   registry.registerPropertySerializer(handleType,
+//   std::make_unique<TransientOnlyPropertySerializer<Handle>>());
 #pragma once
 
 #include "qf/zero/core/messages.h"

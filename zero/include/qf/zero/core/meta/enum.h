@@ -37,7 +37,8 @@ class Enum : public Type {
 
 class Enum::Impl : public Type::Impl {
  public:
-  Impl(std::u16string name, std::u16string qualifiedName) : Type::Impl(std::move(name), std::move(qualifiedName)) {}
+  Impl(std::u16string name, std::u16string qualifiedName)
+      : Type::Impl(std::move(name), std::move(qualifiedName)) {}
   // Literals in the order added; the first is the default value.
   const std::vector<EnumLiteral>& getLiterals() const noexcept { return literals_; }
   void addLiteral(const EnumLiteral& literal);

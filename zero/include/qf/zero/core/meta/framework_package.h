@@ -9,6 +9,7 @@
 #include "qf/zero/core/value.h"
 
 #include <boost/date_time/posix_time/ptime.hpp>
+
 #include <nlohmann/json_fwd.hpp>
 
 #include <functional>

@@ -35,7 +35,8 @@ template <class ImplT>
 ImplT& target(ModelElement::Impl& element, std::u16string_view operation) {
   auto* typed = dynamic_cast<ImplT*>(&element);
   if (typed == nullptr) {
-    reportException(qf0::messages::NoSuchOperation(element.getMetaClass().getQualifiedName(), std::u16string(operation)));
+    reportException(
+        qf0::messages::NoSuchOperation(element.getMetaClass().getQualifiedName(), std::u16string(operation)));
   }
   return *typed;
 }

@@ -20,8 +20,8 @@ namespace qf::zero::meta {
 
 class MetaRegistry {
  public:
-  using CollectionFactory =
-      std::function<std::unique_ptr<AbstractOwnedCollection>(ModelElement::Impl* owner, const Property& property)>;
+  using CollectionFactory = std::function<std::unique_ptr<AbstractOwnedCollection>(ModelElement::Impl* owner,
+                                                                                   const Property& property)>;
   using BuilderFactory = std::function<std::unique_ptr<ModelElement::Builder>(const Model& model)>;
 
   static MetaRegistry& getInstance();

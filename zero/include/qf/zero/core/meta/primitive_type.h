@@ -28,8 +28,8 @@ class ValueTraits {
 
 class PrimitiveType : public Type {
   QF_ZERO_HANDLE(PrimitiveType, Type)
-  static PrimitiveType create(const Model& model, const Uuid& id, std::u16string name, std::u16string qualifiedName,
-                              std::shared_ptr<const ValueTraits> traits);
+  static PrimitiveType create(const Model& model, const Uuid& id, std::u16string name,
+                              std::u16string qualifiedName, std::shared_ptr<const ValueTraits> traits);
 };
 
 class PrimitiveType::Impl : public Type::Impl {

@@ -65,7 +65,8 @@ class PropertySerializerRegistry {
   PropertySerializerRegistry() = default;
 
   mutable std::shared_mutex mutex_;
-  std::map<std::pair<const void*, std::u16string>, std::unique_ptr<PropertySerializer>, std::less<>> properties_;
+  std::map<std::pair<const void*, std::u16string>, std::unique_ptr<PropertySerializer>, std::less<>>
+      properties_;
   std::map<const void*, std::unique_ptr<DatatypeSerializer>> datatypes_;
 };
 

@@ -86,7 +86,8 @@ class Class::Impl : public StructuredType::Impl {
 
 class DataType : public StructuredType {
   QF_ZERO_HANDLE(DataType, StructuredType)
-  static DataType create(const Model& model, const Uuid& id, std::u16string name, std::u16string qualifiedName);
+  static DataType create(const Model& model, const Uuid& id, std::u16string name,
+                         std::u16string qualifiedName);
 };
 
 class DataType::Impl : public StructuredType::Impl {
