@@ -30,6 +30,9 @@ class PacketCodec {
   // a peer must not be able to choose the stack depth. Generous for any model document.
   static constexpr std::size_t maxNestingDepth = 1000;
 
+  // Longest text an error quotes from a peer, so that an error reply stays small.
+  static constexpr std::size_t maxQuotedBytes = 200;
+
   // Raises MalformedPacket when the type or a string in the body is not valid UTF-8.
   static std::string encode(const JSONPacket& packet, std::uint64_t id,
                             std::optional<std::uint64_t> replyTo = std::nullopt);
@@ -37,7 +40,14 @@ class PacketCodec {
   // Raises MalformedPacket naming what is wrong: not JSON, not an object, nested deeper than
   // maxNestingDepth, "type" missing, empty or not a string, "id" missing or not an unsigned
   // integer, "replyTo" present but not an unsigned integer, "body" missing.
+  // Nothing else escapes: whatever the text, the message of the MalformedPacket raised is valid
+  // UTF-8, so an "Error" packet quoting it always encodes.
   static PacketEnvelope decode(std::string_view text);
+
+  // text made safe to quote in an error: control characters and every byte that is not part of
+  // a valid UTF-8 sequence become "\xNN", and text beyond maxBytes is cut at a character boundary
+  // and marked with "...". The result is valid UTF-8 of at most maxBytes + 3 bytes.
+  static std::string quotable(std::string_view text, std::size_t maxBytes = maxQuotedBytes);
 };
 
 }  // namespace qf::zero::io
