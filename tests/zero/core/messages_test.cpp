@@ -66,6 +66,7 @@ TEST(Qf0Messages, EveryKeyHasATextAndAClassWhoseArgumentsFillItsPlaceholders) {
       messageRow<msg::MalformedPacket>("no type member"),
       messageRow<msg::PacketTooLarge>(2000000, 1048576),
       messageRow<msg::UnknownPacketType>("Gossip"),
+      messageRow<msg::PacketHandlerFailed>("Pull", "vector::_M_range_check"),
       messageRow<msg::ConnectionFailed>("127.0.0.1:9", "connection refused"),
       messageRow<msg::ListenFailed>("127.0.0.1:80", "address in use"),
       messageRow<msg::CannotCreateTransportWithoutChannel>(),

@@ -173,4 +173,34 @@ TEST(WebSocketListener, PeersThatFailOrStallTheHandshakeAreDroppedUnseen) {
   EXPECT_EQ(inbox->next(), "still open");
 }
 
+TEST(WebSocketChannel, ATransportAnswersAnOverflowingNumberAndAHandlerThrowingANonExceptionAndCarriesOn) {
+  ChannelPair pair = webSocketChannels().connect();
+  PacketTransport server(pair.b);
+  server.setPacketHandler("Echo", [](const JSONPacket& request) {
+    return boost::optional<JSONPacket>(JSONPacket("OK", request.getJson()));
+  });
+  server.setPacketHandler("Int", [](const JSONPacket&) -> boost::optional<JSONPacket> { throw 42; });
+  auto raw = Inbox::startOn(*pair.a);
+  const auto nextPacket = [&] {
+    const auto text = raw->next();
+    if (!text) throw std::runtime_error("nothing arrived");
+    return PacketCodec::decode(*text);
+  };
+
+  pair.a->send(R"({"type":"Echo","id":9,"body":1e400})");
+  const auto malformed = nextPacket();
+  EXPECT_EQ(malformed.packet.getType(), "Error");
+  EXPECT_EQ(malformed.packet.getJson().at("messageId"), "qf0:messages/MalformedPacket");
+
+  pair.a->send(PacketCodec::encode(JSONPacket("Int", nullptr), 10));
+  const auto failed = nextPacket();
+  EXPECT_EQ(failed.replyTo, 10u);
+  EXPECT_EQ(failed.packet.getJson().at("messageId"), "qf0:messages/PacketHandlerFailed");
+
+  pair.a->send(PacketCodec::encode(JSONPacket("Echo", "still here"), 11));
+  const auto echoed = nextPacket();
+  EXPECT_EQ(echoed.replyTo, 11u);
+  EXPECT_EQ(echoed.packet.getJson(), "still here");
+}
+
 }  // namespace support

@@ -47,6 +47,7 @@ constexpr CatalogEntry entries[] = {
     {"MalformedPacket", "The packet is malformed: {1}."},
     {"PacketTooLarge", "The packet of {1} bytes exceeds the limit of {2} bytes."},
     {"UnknownPacketType", "No handler accepts packets of type '{1}'."},
+    {"PacketHandlerFailed", "{2} (while handling a '{1}' packet)."},
     {"ConnectionFailed", "Cannot connect to {1}: {2}."},
     {"ListenFailed", "Cannot listen on {1}: {2}."},
     {"CannotCreateTransportWithoutChannel", "Cannot create a packet transport without a channel."},

@@ -14,6 +14,7 @@
 #include <mutex>
 #include <optional>
 #include <thread>
+#include <type_traits>
 #include <unordered_map>
 #include <utility>
 
@@ -36,6 +37,26 @@ Json errorBody(const except::ExceptionBase& error) {
   Json body = errorBody(error.message());
   body["messageId"] = error.GetID();
   return body;
+}
+
+template <class M>
+requires std::is_base_of_v<except::Message, M> Json errorBody(M message) {
+  return errorBody(except::Exception<M>(std::move(message)));
+}
+
+// The body of the "Error" reply for the exception being handled, whatever was thrown: a
+// catalog message as it is, anything else as PacketHandlerFailed. REQUIRES: inside a catch.
+Json caughtErrorBody(const std::string& packetType) {
+  try {
+    throw;
+  } catch (const except::ExceptionBase& error) {
+    return errorBody(error);
+  } catch (const std::exception& error) {
+    return errorBody(qf0::messages::PacketHandlerFailed(packetType, error.what()));
+  } catch (...) {
+    return errorBody(qf0::messages::PacketHandlerFailed(
+        packetType, "the handler threw an object that is not a std::exception"));
+  }
 }
 
 // The why of a ChannelClosed raised by the channel.
@@ -149,6 +170,10 @@ class PacketTransport::Impl : public std::enable_shared_from_this<Impl> {
     } catch (const except::ExceptionBase& error) {
       send(JSONPacket(errorPacketType, errorBody(error)), std::nullopt);
       return;
+    } catch (const std::exception& error) {  // out of memory for a huge text, say
+      send(JSONPacket(errorPacketType, errorBody(qf0::messages::MalformedPacket(error.what()))),
+           std::nullopt);
+      return;
     }
     if (envelope->replyTo) {
       resolve(*envelope->replyTo, std::move(envelope->packet));
@@ -163,9 +188,9 @@ class PacketTransport::Impl : public std::enable_shared_from_this<Impl> {
     }
     if (!handler) {
       if (envelope->packet.getType() != errorPacketType) {
-        const except::Exception<qf0::messages::UnknownPacketType> error(
-            qf0::messages::UnknownPacketType(envelope->packet.getType()));
-        send(JSONPacket(errorPacketType, errorBody(error)), envelope->id);
+        send(JSONPacket(errorPacketType,
+                        errorBody(qf0::messages::UnknownPacketType(envelope->packet.getType()))),
+             envelope->id);
       }
       return;
     }
@@ -218,29 +243,23 @@ class PacketTransport::Impl : public std::enable_shared_from_this<Impl> {
     boost::optional<JSONPacket> reply;
     try {
       reply = handler.run(request);
-    } catch (const except::ExceptionBase& error) {
-      send(JSONPacket(errorPacketType, errorBody(error)), id);
-      return;
-    } catch (const std::exception& error) {
-      send(JSONPacket(errorPacketType, errorBody(error.what())), id);
-      return;
     } catch (...) {
-      send(JSONPacket(errorPacketType, errorBody("the handler threw something that is not an exception")),
-           id);
+      send(JSONPacket(errorPacketType, caughtErrorBody(request.getType())), id);
       return;
     }
     if (reply) send(*reply, id);
   }
 
   // Sends a packet of our own making. Failures have nobody to go to: a closed channel means
-  // the peer is gone; a reply that cannot be sent (too large, not UTF-8) is replaced by an
-  // Error reply saying why, so the requester does not wait in vain.
-  void send(const JSONPacket& packet, std::optional<std::uint64_t> replyTo) {
+  // the peer is gone; a reply that cannot be sent (too large, not UTF-8; an "Error" reply a
+  // handler made included) is replaced once by an Error reply saying why, so the requester does
+  // not wait in vain. errorBody makes that one always encodable.
+  void send(const JSONPacket& packet, std::optional<std::uint64_t> replyTo, bool isReplacement = false) {
     try {
       channel_->send(PacketCodec::encode(packet, nextId_++, replyTo));
     } catch (const except::Exception<qf0::messages::ChannelClosed>&) {
     } catch (const except::ExceptionBase& error) {
-      if (packet.getType() != errorPacketType) send(JSONPacket(errorPacketType, errorBody(error)), replyTo);
+      if (!isReplacement) send(JSONPacket(errorPacketType, errorBody(error)), replyTo, true);
     } catch (const std::exception&) {
     }
   }

@@ -63,8 +63,10 @@ FOUNDATION_MESSAGE(catalog, ExchangeFailed, std::string, std::string)    // repl
 FOUNDATION_MESSAGE(catalog, MalformedPacket, std::string)                // what is wrong
 FOUNDATION_MESSAGE(catalog, PacketTooLarge, std::int64_t, std::int64_t)  // size, limit
 FOUNDATION_MESSAGE(catalog, UnknownPacketType, std::string)              // packet type
-FOUNDATION_MESSAGE(catalog, ConnectionFailed, std::string, std::string)  // endpoint, why
-FOUNDATION_MESSAGE(catalog, ListenFailed, std::string, std::string)      // endpoint, why
+// A packet handler threw something that is not a catalog message.
+FOUNDATION_MESSAGE(catalog, PacketHandlerFailed, std::string, std::string)  // packet type, what it threw
+FOUNDATION_MESSAGE(catalog, ConnectionFailed, std::string, std::string)     // endpoint, why
+FOUNDATION_MESSAGE(catalog, ListenFailed, std::string, std::string)         // endpoint, why
 FOUNDATION_MESSAGE(catalog, CannotCreateTransportWithoutChannel)
 FOUNDATION_MESSAGE(catalog, ChannelAlreadyStarted)
 

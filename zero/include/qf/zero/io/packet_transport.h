@@ -30,8 +30,10 @@ enum class PacketPromiseMode {
 //
 // Incoming packets that are not replies go to the handler registered for their type. Faults are
 // answered, never fatal:
-//  - a handler that throws: an "Error" reply, body {"message": <what()>} (plus "messageId",
-//    "catalog/key", when it raised a catalog message);
+//  - a handler that throws, whatever it throws: an "Error" reply, body {"message": <text>,
+//    "messageId": "catalog/key"} of the catalog message it raised, or else of
+//    PacketHandlerFailed (quoting what() of a std::exception);
+//  - a reply that cannot be encoded (not UTF-8, too large): an "Error" reply saying why;
 //  - a type without a handler: an "Error" reply whose body names UnknownPacketType. Packets of
 //    type "Error" without a handler are dropped instead, so two transports never trade errors;
 //  - a text that is not a packet: an "Error" packet without "replyTo" naming MalformedPacket.
