@@ -3,6 +3,7 @@
 #pragma once
 
 #include "qf/zero/core/meta/named_element.h"
+#include "qf/zero/core/meta/type.h"  // complete: the constructor instantiates std::vector<Type>
 
 #include <string>
 #include <vector>
