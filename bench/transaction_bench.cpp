@@ -2,8 +2,13 @@
 // The cost should follow k and not N: a commit touches only what changed.
 // Arguments: N, k, and the batch size of the transactions that built the model (0: one
 // transaction for all N).
+//
+// Cost of one transaction that creates m elements, each in a savepoint of its own and
+// added to one folder's collection, as history records a commit's storages: the cost per
+// element should not grow with m.
 #include "qf/zero/core/meta/meta_registry.h"
 #include "qf/zero/core/model_impl.h"
+#include "qf/zero/core/reference_collection.h"
 
 #include <benchmark/benchmark.h>
 
@@ -22,6 +27,21 @@ struct Counter {
     count->setType(meta::MetaRegistry::getInstance().getPrimitiveType(u"Integer"));
     count->setPropertyIndex(1);
     item->addProperty(count);
+  }
+};
+
+struct Folder {
+  Model metaModel = Model::create();
+  meta::Class folder = meta::Class::create(metaModel, {}, u"Folder", u"bench.Folder", false);
+  meta::Class item = meta::Class::create(metaModel, {}, u"Item", u"bench.FolderItem", false);
+  meta::Property items = meta::Property::create(metaModel, {}, u"items", meta::ValueFlags::Sequence, true);
+  Folder() {
+    folder->setSuperclass(ModelElement::metaClass());
+    item->setSuperclass(ModelElement::metaClass());
+    items->setType(item);
+    items->setPropertyIndex(1);
+    items->setIsUnique(true);
+    folder->addProperty(items);
   }
 };
 
@@ -69,5 +89,34 @@ BENCHMARK(commitOfKChangesInModelOfN)
     ->Args({100000, 100, 0})
     ->ArgNames({"N", "k", "batch"})
     ->Unit(benchmark::kMicrosecond);
+
+void createMInSavepointsOfOneTransaction(benchmark::State& state) {
+  const auto m = static_cast<std::size_t>(state.range(0));
+  static Folder meta;
+  for (auto _ : state) {
+    Model model = Model::create();
+    Transaction outer = model->beginTransaction();
+    const ModelElement folder = meta.folder.instantiate(model);
+    auto* items = folder.getPropertyValue(meta.items).getValue<ReferenceCollection*>();
+    for (std::size_t i = 0; i < m; ++i) {
+      Transaction savepoint = model->beginTransaction();
+      items->add(meta.item.instantiate(model));
+      savepoint.commit();
+    }
+    outer.commit();
+    state.PauseTiming();
+    model = Model();  // freeing the model is not what is measured
+    state.ResumeTiming();
+  }
+  state.counters["per_element_ns"] = benchmark::Counter(
+      static_cast<double>(m), benchmark::Counter::kIsIterationInvariantRate | benchmark::Counter::kInvert);
+}
+
+BENCHMARK(createMInSavepointsOfOneTransaction)
+    ->Arg(1000)
+    ->Arg(3000)
+    ->Arg(9000)
+    ->ArgName("m")
+    ->Unit(benchmark::kMillisecond);
 
 }  // namespace
