@@ -60,8 +60,8 @@ struct Parts {
     Transaction t = model->beginTransaction();
     for (std::size_t i = 0; i < n; ++i) {
       ModelElement e = part.instantiate(model);
-      e.setPropertyValue(
-          name, Value::of(u"part-" + std::u16string(std::to_string(i).begin(), std::to_string(i).end())));
+      const std::string digits = std::to_string(i);  // one string: both iterators must point into it
+      e.setPropertyValue(name, Value::of(u"part-" + std::u16string(digits.begin(), digits.end())));
       e.setPropertyValue(count, Value::of(static_cast<int>(i)));
       auto* tagSet = e.getPropertyValue(tags).getValue<PrimitiveCollection*>();
       tagSet->genericAdd(Value::of(std::u16string(u"tag") + char16_t(u'a' + i % 7)));
