@@ -83,9 +83,12 @@ const Parts& parts() {
 }
 
 const Model& modelOf(std::size_t n) {
+  // The metamodel first: statics are destroyed in reverse order, and a model's teardown
+  // needs its classes.
+  const Parts& metamodel = parts();
   static std::map<std::size_t, Model> models;
   auto it = models.find(n);
-  if (it == models.end()) it = models.emplace(n, parts().build(n)).first;
+  if (it == models.end()) it = models.emplace(n, metamodel.build(n)).first;
   return it->second;
 }
 
