@@ -6,6 +6,9 @@
 
 #include <gtest/gtest.h>
 
+#include <tuple>
+#include <utility>
+
 namespace qf::zero {
 namespace {
 
@@ -45,13 +48,20 @@ ReferenceCollection* books(const Library& l, const ModelElement& shelf) {
   return shelf.getPropertyValue(l.shelfBooks).getValue<ReferenceCollection*>();
 }
 
-TEST(Transaction, CancelRestoresCreatedChangedAndDestroyedElements) {
-  Library l;
-  Model model = Model::create();
+// A shelf holding one book titled "Dune".
+std::pair<ModelElement, ModelElement> shelvedDune(const Library& l, const Model& model) {
   ModelElement shelf = l.shelf.instantiate(model);
   ModelElement dune = l.book.instantiate(model);
   books(l, shelf)->add(dune);
   dune.setPropertyValue(l.title, Value::of(std::u16string(u"Dune")));
+  return {shelf, dune};
+}
+
+TEST(Transaction, CancelRestoresCreatedChangedAndDestroyedElements) {
+  Library l;
+  Model model = Model::create();
+  ModelElement shelf, dune;
+  std::tie(shelf, dune) = shelvedDune(l, model);
   ASSERT_EQ(dune.container(), shelf);
   {
     Transaction t = model->beginTransaction();
@@ -84,10 +94,8 @@ class DestroyThenRecreate : public ::testing::TestWithParam<Reuse> {};
 TEST_P(DestroyThenRecreate, CancelBringsBackTheOldElementUnderItsUuid) {
   Library l;
   Model model = Model::create();
-  ModelElement shelf = l.shelf.instantiate(model);
-  ModelElement dune = l.book.instantiate(model);
-  books(l, shelf)->add(dune);
-  dune.setPropertyValue(l.title, Value::of(std::u16string(u"Dune")));
+  ModelElement shelf, dune;
+  std::tie(shelf, dune) = shelvedDune(l, model);
   const Uuid id = dune.getUuid();
   const Reuse reuse = GetParam();
   const auto recreate = [&] {
