@@ -90,7 +90,9 @@ BENCHMARK(commitOfKChangesInModelOfN)
     ->ArgNames({"N", "k", "batch"})
     ->Unit(benchmark::kMicrosecond);
 
-void createMInSavepointsOfOneTransaction(benchmark::State& state) {
+// One transaction creating m elements into one folder's collection, each creation in a
+// savepoint of its own or all at the outermost level.
+void createMInOneTransaction(benchmark::State& state, bool savepoints) {
   const auto m = static_cast<std::size_t>(state.range(0));
   static Folder meta;
   for (auto _ : state) {
@@ -99,9 +101,13 @@ void createMInSavepointsOfOneTransaction(benchmark::State& state) {
     const ModelElement folder = meta.folder.instantiate(model);
     auto* items = folder.getPropertyValue(meta.items).getValue<ReferenceCollection*>();
     for (std::size_t i = 0; i < m; ++i) {
-      Transaction savepoint = model->beginTransaction();
-      items->add(meta.item.instantiate(model));
-      savepoint.commit();
+      if (savepoints) {
+        Transaction savepoint = model->beginTransaction();
+        items->add(meta.item.instantiate(model));
+        savepoint.commit();
+      } else {
+        items->add(meta.item.instantiate(model));
+      }
     }
     outer.commit();
     state.PauseTiming();
@@ -112,10 +118,19 @@ void createMInSavepointsOfOneTransaction(benchmark::State& state) {
       static_cast<double>(m), benchmark::Counter::kIsIterationInvariantRate | benchmark::Counter::kInvert);
 }
 
+void createMInSavepointsOfOneTransaction(benchmark::State& state) { createMInOneTransaction(state, true); }
+void createMWithoutSavepoints(benchmark::State& state) { createMInOneTransaction(state, false); }
+
 BENCHMARK(createMInSavepointsOfOneTransaction)
     ->Arg(1000)
-    ->Arg(3000)
-    ->Arg(9000)
+    ->Arg(10000)
+    ->Arg(100000)
+    ->ArgName("m")
+    ->Unit(benchmark::kMillisecond);
+BENCHMARK(createMWithoutSavepoints)
+    ->Arg(1000)
+    ->Arg(10000)
+    ->Arg(100000)
     ->ArgName("m")
     ->Unit(benchmark::kMillisecond);
 

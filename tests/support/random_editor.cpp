@@ -83,7 +83,7 @@ void RandomEditor::edit() {
     editGadget(a);
     return;
   }
-  switch (pick(13)) {
+  switch (pick(16)) {
     case 0:
       a.setPropertyValue(tm_.name, Value::of(someName()));
       break;
@@ -121,6 +121,18 @@ void RandomEditor::edit() {
     case 11:
       a.setPropertyValue(tm_.born, Value::of(DateTime(boost::gregorian::date(2020, 1, 1 + pick(5)))));
       break;
+    case 13:
+      tm_.refs(a, tm_.children)->removeAt(static_cast<std::size_t>(pick(3)));
+      break;
+    case 14:
+      if (pick(2) == 0)
+        tm_.refs(a, tm_.friends)->clear();
+      else
+        tm_.values(a, tm_.tags)->genericClear();
+      break;
+    case 15:
+      tm_.refs(a, tm_.index)->remove(b);
+      break;
     case 12:
       if (pick(3) == 0) {
         const Uuid id = a.getUuid();
@@ -132,7 +144,19 @@ void RandomEditor::edit() {
 }
 
 void RandomEditor::editGadget(ModelElement& gadget) {
-  switch (pick(6)) {
+  switch (pick(8)) {
+    case 6: {
+      auto* scores = tm_.values(gadget, tm_.scores);
+      const auto at = static_cast<std::size_t>(pick(3));
+      if (pick(2) == 0)
+        scores->genericInsert(at, Value::of(pick(3)));
+      else
+        scores->genericRemoveAt(at);
+      break;
+    }
+    case 7:
+      tm_.values(gadget, tm_.scores)->genericReplace(static_cast<std::size_t>(pick(3)), Value::of(pick(3)));
+      break;
     case 0:
       gadget.setPropertyValue(tm_.flag, Value::of(pick(2) == 0));
       break;

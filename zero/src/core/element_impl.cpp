@@ -202,13 +202,11 @@ void ModelElement::Impl::assignValue(const meta::Property& property, const Value
   for (const IncomingReference& incoming : incoming_) collectMap(incoming.source, incoming.property);
 
   Transaction transaction = model_->beginTransaction(false);
-  for (ReferenceCollection* map : keyedMaps) {
-    map->modifying();
-    map->rawErase(this);
-  }
+  for (ReferenceCollection* map : keyedMaps) map->recordedErase(this);
   notifyModifying(property.getIndex());
   basicSetValue(property, value.isEmpty() && !property->isOptional() ? property->getDefaultValue() : value);
-  for (ReferenceCollection* map : keyedMaps) map->rawInsert(ReferenceCollection::npos, ModelElement(this));
+  for (ReferenceCollection* map : keyedMaps)
+    map->recordedInsert(ReferenceCollection::npos, ModelElement(this));
   transaction.commit();
 }
 
@@ -261,20 +259,17 @@ Value ModelElement::Impl::invoke(const meta::Operation& operation, std::vector<V
 
 void ModelElement::Impl::recordedAdd(const meta::Property& property, const ModelElement& target,
                                      std::size_t position) {
-  notifyModifying(property.getIndex());
   if (property->isMany()) {
-    static_cast<ReferenceCollection*>(basicGetCollection(property))->rawInsert(position, target);
+    static_cast<ReferenceCollection*>(basicGetCollection(property))->recordedInsert(position, target);
   } else {
+    notifyModifying(property.getIndex());
     basicSetValue(property, Value::createElementValue(target, property));
   }
 }
 
 bool ModelElement::Impl::recordedRemove(const meta::Property& property, const Impl* target) {
   if (property->isMany()) {
-    auto* collection = static_cast<ReferenceCollection*>(basicGetCollection(property));
-    if (!collection->basicContains(target)) return false;
-    notifyModifying(property.getIndex());
-    return collection->rawErase(target);
+    return static_cast<ReferenceCollection*>(basicGetCollection(property))->recordedErase(target);
   }
   if (basicGetValue(property).getElement().getImpl() != target) return false;
   notifyModifying(property.getIndex());
@@ -369,27 +364,35 @@ void ModelElement::Impl::basicUnlinkIncoming(Impl* source, const meta::Property&
 
 // ---- change tracking -------------------------------------------------------------------
 
-void ModelElement::Impl::notifyModifying(int index) {
+void ModelElement::Impl::notifyModifying(int index) { (void)recordOldValue(index); }
+
+std::vector<ModelElement::Impl::CollectionEdit>* ModelElement::Impl::notifyCollectionModifying(int index) {
+  Storage* storage = recordOldValue(index);
+  return storage != nullptr ? storage->editLog(index) : nullptr;
+}
+
+ModelElement::Impl::Storage* ModelElement::Impl::recordOldValue(int index) {
   if (model_ == nullptr || model_->txn_ == nullptr) reportException(qf0::messages::TransactionNotOpen());
   checkModifiable();
   internal::TransactionState& state = *model_->txn_;
   ++state.changeCount;
   internal::ElementRecord& record = model_->recordFor(this);
   const int level = state.currentLevel();
-  if (record.createdLevel == level) return;
+  if (record.createdLevel == level) return nullptr;
   Storage* storage = record.storageAt(level);
   if (storage == nullptr) {
     record.storages.push_back({level, std::shared_ptr<Storage>(createStorage())});
     storage = record.storages.back().storage.get();
     state.list(record);
   }
-  if (storage->isChanged(index)) return;
+  if (storage->isChanged(index)) return storage;
   if (index == kContainerIndex) {
     storage->setOldContainer(container(), containmentFeature());
   } else {
     copyValue(storage, index);
   }
   storage->setChanged(index, true);
+  return storage;
 }
 
 std::unique_ptr<ModelElement::Impl::Storage> ModelElement::Impl::createStorage() const {
@@ -400,7 +403,7 @@ std::unique_ptr<ModelElement::Impl::Storage> ModelElement::Impl::createStorage()
 void ModelElement::Impl::copyValue(Storage* storage, int index) const {
   const meta::Property property = getPropertyByIndex(index);
   if (property->isMany()) {
-    storage->setOldCollection(index, basicGetCollection(property)->snapshot());
+    storage->startEditLog(index);
   } else {
     storage->setOldValue(index, basicGetValue(property));
   }
@@ -420,7 +423,11 @@ void ModelElement::Impl::restoreFromStorage(Storage* storage, bool collections) 
     const meta::Property property = getPropertyByIndex(index);
     if (property->isMany() != collections) continue;
     if (collections) {
-      basicGetCollection(property)->restore(storage->oldCollection(index));
+      if (storage->holdsEditLog(index)) {
+        basicGetCollection(property)->undo(storage->editLogOf(index));
+      } else {
+        basicGetCollection(property)->restore(storage->oldCollection(index));
+      }
     } else {
       basicSetValue(property, storage->oldValue(index));
     }
@@ -433,13 +440,16 @@ void ModelElement::Impl::registerIn(ModelImpl* model, const Uuid& id) {
   if (model == nullptr) reportException(qf0::messages::CannotCreateWithoutModel());
   if (model->isFrozen()) reportException(qf0::messages::CannotModifyFrozenModel());
   const Uuid uuid = id.is_nil() ? generateNewUuid() : id;
-  if (model->elements_.count(uuid) != 0) reportException(qf0::messages::DuplicateElementId(toText(uuid)));
+  // One look-up both refuses a taken UUID and claims a free one.
+  auto [entry, claimed] = model->elements_.try_emplace(uuid);
+  if (!claimed) reportException(qf0::messages::DuplicateElementId(toText(uuid)));
+  entry->second = IntrusivePtr<Impl>(this);
   Transaction transaction = model->beginTransaction(false);
   uuid_ = uuid;
   model_ = model;
   serial_ = model->nextSerial_++;
   state_ = State::Live;
-  model->registerElement(this);
+  model->indexElement(this);
   ++model->txn_->changeCount;
   internal::ElementRecord& record = model->recordFor(this);
   record.createdLevel = model->txn_->currentLevel();

@@ -94,10 +94,14 @@ std::vector<ModelElement> ModelImpl::getInstances(const meta::Class& metaClass,
 }
 
 void ModelImpl::registerElement(ModelElement::Impl* element) {
-  proxies_.erase(element->uuid_);
   // An element a cancel brings back takes its UUID over from one created since with the
   // same UUID, which the same cancel removes.
   elements_.insert_or_assign(element->uuid_, IntrusivePtr<ModelElement::Impl>(element));
+  indexElement(element);
+}
+
+void ModelImpl::indexElement(ModelElement::Impl* element) {
+  if (!proxies_.empty()) proxies_.erase(element->uuid_);
   instances_[element->getMetaClass().getImpl()].emplace(element->serial_, element);
   updateTopLevel(element);
 }
@@ -321,6 +325,7 @@ std::shared_ptr<ReportData> ModelImpl::buildReport(bool deep, const boost::optio
     }
     auto storage = record.storages.empty() ? nullptr : record.storages.front().storage;
     if (destroyed) {
+      if (storage) storage->materialize(record.element.get());
       entries.push_back({element, ReportData::Kind::Destroyed, storage});
       continue;
     }

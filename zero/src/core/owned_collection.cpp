@@ -4,7 +4,9 @@
 
 namespace qf::zero {
 
-void AbstractOwnedCollection::modifying() { owner_->notifyModifying(property_.getIndex()); }
+std::vector<ModelElement::Impl::CollectionEdit>* AbstractOwnedCollection::modifying() {
+  return owner_->notifyCollectionModifying(property_.getIndex());
+}
 
 AbstractOwnedCollection::Operation::Operation(AbstractOwnedCollection& collection) {
   collection.owner_->checkModifiable();

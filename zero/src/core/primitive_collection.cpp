@@ -1,11 +1,14 @@
 #include "qf/zero/core/primitive_collection.h"
 
+#include "qf/zero/core/internal/storage.h"
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/report_exception.h"
 
 #include <algorithm>
 
 namespace qf::zero {
+
+using CollectionEdit = ModelElement::Impl::CollectionEdit;
 
 namespace {
 
@@ -25,7 +28,7 @@ void PrimitiveCollection::checkItem(const Value& value) const {
 
 Value PrimitiveCollection::genericAt(std::size_t index) const {
   checkIndex(index, size());
-  return getAllValues()[index];
+  return basicValueAt(index);
 }
 
 std::optional<std::size_t> PrimitiveCollection::genericIndexOf(const Value& value) const {
@@ -40,8 +43,7 @@ void PrimitiveCollection::genericInsert(std::size_t index, const Value& value) {
   checkItem(value);
   if (isUnique() && genericIndexOf(value)) return;
   if (index > size()) checkIndex(index, size());
-  modifying();
-  basicInsertValue(index, value);
+  recordedInsertValue(index, value);
   operation.commit();
 }
 
@@ -55,16 +57,14 @@ bool PrimitiveCollection::genericRemove(const Value& value) {
 void PrimitiveCollection::genericRemoveAt(std::size_t index) {
   checkIndex(index, size());
   Operation operation(*this);
-  modifying();
-  basicEraseAt(index);
+  recordedEraseAt(index);
   operation.commit();
 }
 
 void PrimitiveCollection::genericClear() {
   if (size() == 0) return;
   Operation operation(*this);
-  modifying();
-  basicClearValues();
+  recordedClear();
   operation.commit();
 }
 
@@ -72,9 +72,8 @@ void PrimitiveCollection::genericReplace(std::size_t index, const Value& value) 
   checkIndex(index, size());
   Operation operation(*this);
   checkItem(value);
-  modifying();
-  basicEraseAt(index);
-  basicInsertValue(index, value);
+  recordedEraseAt(index);
+  recordedInsertValue(index, value);
   operation.commit();
 }
 
@@ -83,21 +82,65 @@ void PrimitiveCollection::genericEnsureAt(std::size_t index) {
   Operation operation(*this);
   const Value filler = property_->getDefaultValue();
   if (filler.isEmpty()) reportException(qf0::messages::InvalidValue());
-  modifying();
-  while (size() <= index) basicInsertValue(size(), filler);
+  while (size() <= index) recordedInsertValue(size(), filler);
   operation.commit();
 }
 
 void PrimitiveCollection::copyValues(const std::vector<Value>& values) {
   Operation operation(*this);
   for (const Value& value : values) checkItem(value);
-  modifying();
-  basicClearValues();
+  recordedClear();
   for (const Value& value : values) {
     if (isUnique() && genericIndexOf(value)) continue;
-    basicInsertValue(size(), value);
+    recordedInsertValue(size(), value);
   }
   operation.commit();
+}
+
+void PrimitiveCollection::recordedInsertValue(std::size_t index, const Value& value) {
+  std::vector<CollectionEdit>* log = modifying();
+  const std::size_t at = std::min(index, size());
+  basicInsertValue(at, value);
+  if (log != nullptr) log->push_back({CollectionEdit::Kind::Inserted, at, value, MapKey()});
+}
+
+void PrimitiveCollection::recordedEraseAt(std::size_t index) {
+  std::vector<CollectionEdit>* log = modifying();
+  if (log != nullptr) log->push_back({CollectionEdit::Kind::Erased, index, basicValueAt(index), MapKey()});
+  basicEraseAt(index);
+}
+
+// Logged last item first, so that undoing puts them back front to back.
+void PrimitiveCollection::recordedClear() {
+  std::vector<CollectionEdit>* log = modifying();
+  if (log != nullptr) {
+    for (std::size_t index = size(); index-- > 0;)
+      log->push_back({CollectionEdit::Kind::Erased, index, basicValueAt(index), MapKey()});
+  }
+  basicClearValues();
+}
+
+void PrimitiveCollection::undo(const std::vector<CollectionEdit>& edits) {
+  for (auto edit = edits.rbegin(); edit != edits.rend(); ++edit) {
+    if (edit->kind == CollectionEdit::Kind::Erased) {
+      basicInsertValue(std::min(edit->position, size()), edit->item);
+    } else if (edit->position < size()) {
+      basicEraseAt(edit->position);
+    }
+  }
+}
+
+std::vector<Value> PrimitiveCollection::contentsBefore(const std::vector<CollectionEdit>& edits) const {
+  std::vector<Value> items = getAllValues();
+  for (auto edit = edits.rbegin(); edit != edits.rend(); ++edit) {
+    const auto at = static_cast<std::ptrdiff_t>(std::min(edit->position, items.size()));
+    if (edit->kind == CollectionEdit::Kind::Erased) {
+      items.insert(items.begin() + at, edit->item);
+    } else if (edit->position < items.size()) {
+      items.erase(items.begin() + at);
+    }
+  }
+  return items;
 }
 
 bool PrimitiveCollection::sameContents(const std::vector<Value>& items) const {

@@ -1,11 +1,18 @@
 #include "qf/zero/core/reference_collection.h"
 
+#include "qf/zero/core/internal/storage.h"
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/meta/structured_type.h"
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/report_exception.h"
 
+#include <algorithm>
+#include <unordered_map>
+#include <utility>
+
 namespace qf::zero {
+
+using CollectionEdit = ModelElement::Impl::CollectionEdit;
 
 bool ReferenceCollection::isComposite() const { return property_->isContainment(); }
 bool ReferenceCollection::isSequenceInterface() const noexcept { return property_->isSequence(); }
@@ -150,6 +157,47 @@ bool ReferenceCollection::rawErase(const ModelElement::Impl* element) {
   return true;
 }
 
+bool ReferenceCollection::rawEraseAt(std::size_t position) {
+  if (position >= size()) return false;
+  if (!isPositional()) return rawErase(basicAt(position).getImpl());
+  const ModelElement element = basicAt(position);
+  basicEraseAt(position);
+  if (!isComposite()) element->basicUnlinkIncoming(owner_, property_);
+  return true;
+}
+
+bool ReferenceCollection::recordedInsert(std::size_t position, const ModelElement& element) {
+  std::vector<CollectionEdit>* log = modifying();
+  const std::size_t at = isPositional() && position < size() ? position : size();
+  CollectionEdit edit{CollectionEdit::Kind::Inserted, at, Value(), MapKey()};
+  if (property_->isMap()) edit.key = keyOf(element);
+  if (!rawInsert(at, element)) return false;
+  if (log != nullptr) {
+    edit.item = Value::of(element);
+    log->push_back(std::move(edit));
+  }
+  return true;
+}
+
+bool ReferenceCollection::recordedErase(const ModelElement::Impl* element) {
+  if (!basicContains(element)) return false;
+  std::vector<CollectionEdit>* log = modifying();
+  const ModelElement handle(const_cast<ModelElement::Impl*>(element));
+  CollectionEdit edit{CollectionEdit::Kind::Erased, 0, Value(), MapKey()};
+  if (isPositional()) {
+    edit.position = basicIndexOf(element).value_or(0);
+    rawEraseAt(edit.position);
+  } else {
+    if (property_->isMap()) edit.key = keyOf(handle);
+    rawErase(element);
+  }
+  if (log != nullptr) {
+    edit.item = Value::of(handle);
+    log->push_back(std::move(edit));
+  }
+  return true;
+}
+
 void ReferenceCollection::rawClear() {
   if (!isComposite()) {
     basicForEach([&](const ModelElement& element) { element->basicUnlinkIncoming(owner_, property_); });
@@ -228,6 +276,65 @@ std::vector<Value> ReferenceCollection::snapshot() const {
 void ReferenceCollection::restore(const std::vector<Value>& items) {
   rawClear();
   for (const Value& item : items) rawInsert(npos, item.getElement());
+}
+
+void ReferenceCollection::undo(const std::vector<CollectionEdit>& edits) {
+  for (auto edit = edits.rbegin(); edit != edits.rend(); ++edit) {
+    const ModelElement& element = edit->item.getElement();
+    if (edit->kind == CollectionEdit::Kind::Erased) {
+      rawInsert(isPositional() ? edit->position : npos, element);
+    } else if (isPositional()) {
+      rawEraseAt(edit->position);
+    } else if (!rawErase(element.getImpl())) {
+      // A proxy logged here may have been replaced, unrecorded, by its resident
+      // element: both stand for the same reference.
+      for (const ModelElement& held : getAllValuesAndProxies()) {
+        if (held->getUuid() == element->getUuid()) {
+          rawErase(held.getImpl());
+          break;
+        }
+      }
+    }
+  }
+}
+
+std::vector<Value> ReferenceCollection::contentsBefore(const std::vector<CollectionEdit>& edits) const {
+  std::vector<Value> items = snapshot();
+  if (isPositional()) {
+    for (auto edit = edits.rbegin(); edit != edits.rend(); ++edit) {
+      const auto at = static_cast<std::ptrdiff_t>(std::min(edit->position, items.size()));
+      if (edit->kind == CollectionEdit::Kind::Erased) {
+        items.insert(items.begin() + at, edit->item);
+      } else if (edit->position < items.size()) {
+        items.erase(items.begin() + at);
+      }
+    }
+    return items;
+  }
+  // A set or map holds an item at most once: it was there before the edits when its
+  // first edit took it out, or when no edit touched it.
+  std::unordered_map<const ModelElement::Impl*, const CollectionEdit*> firstEdit;
+  for (const CollectionEdit& edit : edits) firstEdit.emplace(edit.item.getElement().getImpl(), &edit);
+  std::vector<std::pair<MapKey, Value>> before;
+  before.reserve(items.size());
+  const bool map = property_->isMap();
+  for (Value& item : items) {
+    const ModelElement& element = item.getElement();
+    if (firstEdit.count(element.getImpl()) != 0) continue;
+    before.emplace_back(map ? keyOf(element) : MapKey(), std::move(item));
+  }
+  for (const CollectionEdit& edit : edits) {
+    if (edit.kind == CollectionEdit::Kind::Erased && firstEdit[edit.item.getElement().getImpl()] == &edit) {
+      before.emplace_back(edit.key, edit.item);
+    }
+  }
+  if (map) {
+    std::stable_sort(before.begin(), before.end(),
+                     [](const auto& left, const auto& right) { return left.first < right.first; });
+  }
+  items.clear();
+  for (auto& [key, item] : before) items.push_back(std::move(item));
+  return items;
 }
 
 bool ReferenceCollection::sameContents(const std::vector<Value>& items) const {

@@ -2,6 +2,8 @@
 
 #include "qf/zero/core/owned_collection.h"
 
+#include <iterator>
+
 namespace qf::zero {
 
 ModelElement::Impl::Storage::Storage(const Uuid& id, const Model&, const meta::Class& metaClass, int count)
@@ -45,24 +47,37 @@ ModelElement::Impl::Storage::Slot& ModelElement::Impl::Storage::slot(int index) 
 void ModelElement::Impl::Storage::setOldValue(int index, Value value) {
   Slot& s = slot(index);
   s.value = std::move(value);
-  s.isCollection = false;
-  s.present = true;
+  s.kind = SlotKind::Value;
 }
 
 void ModelElement::Impl::Storage::setOldCollection(int index, std::vector<Value> items) {
   Slot& s = slot(index);
   s.items = std::move(items);
-  s.isCollection = true;
-  s.present = true;
+  s.edits.clear();
+  s.kind = SlotKind::Contents;
+}
+
+void ModelElement::Impl::Storage::startEditLog(int index) {
+  Slot& s = slot(index);
+  s.items.clear();
+  s.edits.clear();
+  s.kind = SlotKind::EditLog;
 }
 
 bool ModelElement::Impl::Storage::holdsSlot(int index) const {
-  return static_cast<std::size_t>(index) < slots_.size() && slots_[static_cast<std::size_t>(index)].present;
+  return static_cast<std::size_t>(index) < slots_.size() &&
+         slots_[static_cast<std::size_t>(index)].kind != SlotKind::Empty;
 }
 
 bool ModelElement::Impl::Storage::holdsCollection(int index) const {
+  if (static_cast<std::size_t>(index) >= slots_.size()) return false;
+  const SlotKind kind = slots_[static_cast<std::size_t>(index)].kind;
+  return kind == SlotKind::Contents || kind == SlotKind::EditLog;
+}
+
+bool ModelElement::Impl::Storage::holdsEditLog(int index) const {
   return static_cast<std::size_t>(index) < slots_.size() &&
-         slots_[static_cast<std::size_t>(index)].isCollection;
+         slots_[static_cast<std::size_t>(index)].kind == SlotKind::EditLog;
 }
 
 const Value& ModelElement::Impl::Storage::oldValue(int index) const {
@@ -73,6 +88,26 @@ const std::vector<Value>& ModelElement::Impl::Storage::oldCollection(int index) 
   return slots_.at(static_cast<std::size_t>(index)).items;
 }
 
+std::vector<ModelElement::Impl::CollectionEdit>* ModelElement::Impl::Storage::editLog(int index) {
+  return holdsEditLog(index) ? &slots_[static_cast<std::size_t>(index)].edits : nullptr;
+}
+
+const std::vector<ModelElement::Impl::CollectionEdit>& ModelElement::Impl::Storage::editLogOf(
+    int index) const {
+  return slots_.at(static_cast<std::size_t>(index)).edits;
+}
+
+void ModelElement::Impl::Storage::materialize(Impl* element) {
+  for (std::size_t index = 0; index < slots_.size(); ++index) {
+    Slot& s = slots_[index];
+    if (s.kind != SlotKind::EditLog) continue;
+    const meta::Property property = element->getPropertyByIndex(static_cast<int>(index));
+    s.items = element->basicGetCollection(property)->contentsBefore(s.edits);
+    s.edits = {};
+    s.kind = SlotKind::Contents;
+  }
+}
+
 Value ModelElement::Impl::Storage::getOldValue(const meta::Property& property, AccessTag) const {
   const int index = property.getIndex();
   if (holdsCollection(index)) return Value::list(oldCollection(index), property);
@@ -80,6 +115,7 @@ Value ModelElement::Impl::Storage::getOldValue(const meta::Property& property, A
 }
 
 void ModelElement::Impl::Storage::revertUnchanged(Impl* element) {
+  materialize(element);
   if (isChanged(kContainerIndex) && oldContainer_.getImpl() == element->containerImpl() &&
       oldFeature_ == element->containmentFeature()) {
     setChanged(kContainerIndex, false);
@@ -106,9 +142,20 @@ void ModelElement::Impl::Storage::mergeInto(Storage& outer) {
     outer.setChanged(kContainerIndex, true);
   }
   for (int index : changedIndexes()) {
-    if (outer.isChanged(index) || !holdsSlot(index)) continue;
-    outer.slot(index) = std::move(slot(index));
-    outer.setChanged(index, true);
+    if (!holdsSlot(index)) continue;
+    if (!outer.isChanged(index)) {
+      outer.slot(index) = std::move(slot(index));
+      outer.setChanged(index, true);
+    } else if (std::vector<CollectionEdit>* outerLog = outer.editLog(index);
+               outerLog && holdsEditLog(index)) {
+      std::vector<CollectionEdit>& log = slot(index).edits;
+      if (outerLog->empty()) {
+        *outerLog = std::move(log);
+      } else {
+        outerLog->insert(outerLog->end(), std::make_move_iterator(log.begin()),
+                         std::make_move_iterator(log.end()));
+      }
+    }
   }
 }
 

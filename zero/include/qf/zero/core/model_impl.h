@@ -118,6 +118,8 @@ class ModelImpl final : public RefCounted {
 
   // Element bookkeeping, called by ModelElement::Impl and rollback.
   void registerElement(ModelElement::Impl* element);
+  // The rest of registerElement, for an element already entered in elements_.
+  void indexElement(ModelElement::Impl* element);
   void unregisterElement(ModelElement::Impl* element) noexcept;
   void updateTopLevel(ModelElement::Impl* element) noexcept;
   internal::ElementRecord& recordFor(ModelElement::Impl* element);

@@ -25,8 +25,9 @@ class AbstractOwnedCollection : public GenericCollectionInterface {
 
   ModelElement::Impl* getOwner() const noexcept { return owner_; }
   const meta::Property& getCollectionProperty() const noexcept { return property_; }
-  // Records the owner's old contents; call before the first raw change of an operation.
-  void modifying();
+  // Change tracking; call before each raw edit. Returns the log to append the edit to
+  // once made, or null when none is kept (see ModelElement::Impl::notifyCollectionModifying).
+  std::vector<ModelElement::Impl::CollectionEdit>* modifying();
 
   // The guard around every change: checks the owner may change and opens a
   // transaction; commit() at the end, or the changes roll back.
@@ -43,6 +44,14 @@ class AbstractOwnedCollection : public GenericCollectionInterface {
   // index of reference targets; it neither checks nor records.
   virtual std::vector<Value> snapshot() const = 0;
   virtual void restore(const std::vector<Value>& items) = 0;
+  // Raw: takes back `edits`, the log of this collection's edits since some earlier
+  // state, last edit first; the collection is in that state again.
+  virtual void undo(const std::vector<ModelElement::Impl::CollectionEdit>& edits) = 0;
+  // The contents the collection had before `edits`, as snapshot() gave them then
+  // (a map's items in key order; an unordered set's in an unspecified order). Changes
+  // nothing.
+  virtual std::vector<Value> contentsBefore(
+      const std::vector<ModelElement::Impl::CollectionEdit>& edits) const = 0;
   // Equal to a snapshot: in order for sequences, as multisets otherwise.
   virtual bool sameContents(const std::vector<Value>& items) const = 0;
 

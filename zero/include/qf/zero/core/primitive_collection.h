@@ -30,11 +30,20 @@ class PrimitiveCollection : public AbstractOwnedCollection, public GenericSequen
   void genericEnsureAt(std::size_t index) override;
 
   std::vector<Value> snapshot() const override { return getAllValues(); }
+  void undo(const std::vector<ModelElement::Impl::CollectionEdit>& edits) override;
+  std::vector<Value> contentsBefore(
+      const std::vector<ModelElement::Impl::CollectionEdit>& edits) const override;
   bool sameContents(const std::vector<Value>& items) const override;
 
  protected:
   // Raises "InvalidValue" unless `value` fits the property's type.
   void checkItem(const Value& value) const;
+  // Raw edits that change tracking records.
+  void recordedInsertValue(std::size_t index, const Value& value);
+  void recordedEraseAt(std::size_t index);
+  void recordedClear();
+  // REQUIRES: index < size().
+  virtual Value basicValueAt(std::size_t index) const = 0;
   virtual void basicInsertValue(std::size_t index, const Value& value) = 0;
   virtual void basicEraseAt(std::size_t index) = 0;
   virtual void basicClearValues() = 0;
@@ -79,6 +88,7 @@ class PrimitiveCollectionOf : public PrimitiveCollection {
     items_.erase(items_.begin() + static_cast<std::ptrdiff_t>(index));
   }
   void basicClearValues() override { items_.clear(); }
+  Value basicValueAt(std::size_t index) const override { return toValue(items_[index]); }
 
  private:
   Value toValue(const T& item) const {

@@ -58,9 +58,17 @@ class ReferenceCollection : public AbstractOwnedCollection,
   // Raw access, no checks, no recording; the incoming index of targets is kept.
   bool rawInsert(std::size_t position, const ModelElement& element);
   bool rawErase(const ModelElement::Impl* element);
+  // In a positional collection, the item at `position`; otherwise that item wherever it is.
+  bool rawEraseAt(std::size_t position);
   void rawClear();
+  // Raw edits that change tracking records: no checks, no opposite end, no containment.
+  // False (nothing recorded) when the edit does nothing.
+  bool recordedInsert(std::size_t position, const ModelElement& element);
+  bool recordedErase(const ModelElement::Impl* element);
 
-  // The concrete container.
+  // The concrete container. A positional one (a sequence) keeps items where they were
+  // inserted; the others order them themselves (by key, or not at all).
+  virtual bool isPositional() const noexcept = 0;
   virtual bool basicContains(const ModelElement::Impl* element) const = 0;
   virtual ModelElement basicAt(std::size_t index) const = 0;
   virtual void basicForEach(const std::function<void(const ModelElement&)>& visit) const = 0;
@@ -84,6 +92,9 @@ class ReferenceCollection : public AbstractOwnedCollection,
 
   std::vector<Value> snapshot() const override;
   void restore(const std::vector<Value>& items) override;
+  void undo(const std::vector<ModelElement::Impl::CollectionEdit>& edits) override;
+  std::vector<Value> contentsBefore(
+      const std::vector<ModelElement::Impl::CollectionEdit>& edits) const override;
   bool sameContents(const std::vector<Value>& items) const override;
 
   // The key of `element` in a map: the value of the property qualifying this one.
@@ -92,6 +103,8 @@ class ReferenceCollection : public AbstractOwnedCollection,
  protected:
   virtual bool basicInsert(std::size_t position, const ModelElement& element) = 0;
   virtual bool basicErase(const ModelElement::Impl* element) = 0;
+  // REQUIRES: isPositional(), position < size().
+  virtual void basicEraseAt(std::size_t position) = 0;
   virtual void basicClear() = 0;
 };
 
@@ -121,6 +134,12 @@ struct ReferenceStore<T, std::vector<T>> {
     if (--it->second == 0) counts.erase(it);
     items.erase(std::find_if(items.begin(), items.end(), [e](const T& x) { return x.getImpl() == e; }));
     return true;
+  }
+  void eraseAt(std::size_t position) {
+    const auto it = items.begin() + static_cast<std::ptrdiff_t>(position);
+    if (auto count = counts.find(it->getImpl()); count != counts.end() && --count->second == 0)
+      counts.erase(count);
+    items.erase(it);
   }
   std::optional<std::size_t> indexOf(const ModelElement::Impl* e) const {
     if (!contains(e)) return std::nullopt;
@@ -231,6 +250,7 @@ class TypedReferenceCollection : public ReferenceCollection {
   using ReferenceCollection::ReferenceCollection;
 
   std::size_t size() const override { return store_.size(); }
+  bool isPositional() const noexcept override { return internal::ReferenceStore<T, C>::ordered; }
   // The handles in iteration order, typed.
   std::vector<T> getTypedValues() const {
     std::vector<T> result;
@@ -267,6 +287,13 @@ class TypedReferenceCollection : public ReferenceCollection {
       return store_.erase(element, keyOfImpl(element));
     } else {
       return store_.erase(element);
+    }
+  }
+  void basicEraseAt(std::size_t position) override {
+    if constexpr (internal::ReferenceStore<T, C>::ordered) {
+      store_.eraseAt(position);
+    } else {
+      (void)position;
     }
   }
   void basicClear() override { store_.clear(); }

@@ -33,6 +33,7 @@ class ModelElement::Impl : public RefCounted {
  public:
   class Storage;
   class Changes;
+  struct CollectionEdit;
 
   // The container pseudo-property of notifyModifying and Storage.
   static constexpr int kContainerIndex = 0;
@@ -99,8 +100,14 @@ class ModelElement::Impl : public RefCounted {
   // transaction's storage the first time it changes. REQUIRES: an open transaction.
   // Raises when the model is frozen or the element is not live.
   void notifyModifying(int index);
+  // The same for many-valued property `index`, before each raw edit of its collection:
+  // returns the log the caller appends that edit to once made, or null when this level
+  // keeps no log for it (the element was made at this level, or the level holds the
+  // old contents instead).
+  std::vector<CollectionEdit>* notifyCollectionModifying(int index);
   virtual std::unique_ptr<Storage> createStorage() const;
-  // Copies the current value of property `index` (>= 1) into `storage`.
+  // Copies the current value of property `index` (>= 1) into `storage`; for a
+  // many-valued property, starts its edit log instead.
   virtual void copyValue(Storage* storage, int index) const;
   // Restores every property the storage holds, raw. Used by rollback.
   virtual void copyStateFromStorage(Storage* storage);
@@ -189,6 +196,8 @@ class ModelElement::Impl : public RefCounted {
   void setSingleReference(const meta::Property& property, const ModelElement& target, bool initializing);
   void setManyValued(const meta::Property& property, const Value& value);
   void destroySubtree(std::vector<Impl*>& subtree);
+  // notifyModifying's work: the storage of this level, or null for an element made at it.
+  Storage* recordOldValue(int index);
 
   Uuid uuid_{};
   ModelImpl* model_ = nullptr;
