@@ -1,4 +1,5 @@
 #include "history/ancestry.h"
+#include "history/first_parent_states.h"
 #include "history/history_support.h"
 #include "kiv/messages/messages.h"
 #include "kiv/metamodel/commit_impl.h"
@@ -26,6 +27,19 @@ ObjectStorage storageOf(const Commit::Impl& commit, const qf::zero::ModelElement
   const ObjectStorage storage = ObjectStorage::create(commit.getModel());
   storage->setContent(element);
   return storage;
+}
+
+// The walk that the index answers for: from `commit` back along first parents.
+ObjectStorage findByWalk(Commit commit, const qf::zero::Uuid& uuid) {
+  while (history::isLive(commit)) {
+    const Delta delta = commit->getDelta();
+    if (history::isLive(delta)) {
+      if (ObjectStorage storage = delta->getCurrent(uuid)) return storage;
+      if (delta->getIsSnapshot()) return {};
+    }
+    commit = commit->getParent();
+  }
+  return {};
 }
 
 bool hasChildren(const Commit::Impl& commit) {
@@ -89,18 +103,18 @@ void Commit::Impl::addDeleted(const qf::zero::ModelElement& current) {
 }
 
 // First parents only: a state recorded only on a merged-in side line is not found. A
-// snapshot holds the whole state, so the walk ends there.
+// snapshot holds the whole state, so the walk ends there. This commit's own delta may
+// still be growing, so it is read directly; the line behind it is indexed.
 ObjectStorage Commit::Impl::find(const qf::zero::Uuid& uuid) const {
-  Commit commit = self(this);
-  while (history::isLive(commit)) {
-    const Delta delta = commit->getDelta();
-    if (history::isLive(delta)) {
-      if (ObjectStorage storage = delta->getCurrent(uuid)) return storage;
-      if (delta->getIsSnapshot()) return {};
-    }
-    commit = commit->getParent();
+  if (!isLive()) return {};
+  if (const Delta delta = getDelta(); history::isLive(delta)) {
+    if (ObjectStorage storage = delta->getCurrent(uuid)) return storage;
+    if (delta->getIsSnapshot()) return {};
   }
-  return {};
+  Commit commit = getParent();
+  if (!history::isLive(commit)) return {};
+  if (auto indexed = history::FirstParentStates::of(*getModelImpl()).find(commit, uuid)) return *indexed;
+  return findByWalk(commit, uuid);
 }
 
 // The deltas from this commit back along first parents to an initial commit or to the

@@ -379,8 +379,14 @@ def _accessors(d, cls, p):
     else:
         value = f"{QZ}::Value::createPrimitiveValue(property, value)"
     lines += ["", f"void {n}::Impl::set{p.cap}({param(p)} value) {{", "  checkNotProxy();",
-              f"  if ({m} == value) return;", f"  const auto& property = {getter};",
-              f"  assignValue(property, {value}, false);", "}", ""]
+              f"  if ({m} == value) return;", f"  const auto& property = {getter};"]
+    if p.is_reference or p.kind == "optional":
+        lines += [f"  assignValue(property, {value}, false);", "}", ""]
+    else:
+        # The typed value needs no Value wrapper, unless a check of assignValue's needs it.
+        lines += ["  if (!canStoreDirectly(property)) {", f"    assignValue(property, {value}, false);",
+                  "    return;", "  }", f"  {QZ}::Transaction transaction = beginDirectStore(property);",
+                  f"  {m} = value;", "  transaction.commit();", "}", ""]
     lines += [f"void {n}::Impl::basicSet{p.cap}({param(p)} value) {{"]
     if p.is_reference and not p.is_containment:
         lines += [f"  relinkIncoming({m}, value, {getter});"]

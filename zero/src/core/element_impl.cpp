@@ -166,7 +166,10 @@ void ModelElement::Impl::setPropertyValue(const meta::Property& property, const 
 }
 
 void ModelElement::Impl::assignValue(const meta::Property& property, const Value& value, bool initializing) {
-  (void)getPropertyValue(property, AccessTag::NoProxyResolve);  // raises for a foreign property
+  if (!ownsProperty(property)) {
+    reportException(qf0::messages::NoSuchProperty(getMetaClass().getQualifiedName(),
+                                                  property ? property.getName() : std::u16string()));
+  }
   checkModifiable();
   if (property->isReadOnly() && !initializing) {
     reportException(qf0::messages::CannotSetReadOnlyProperty(property.getQualifiedName()));
@@ -208,6 +211,24 @@ void ModelElement::Impl::assignValue(const meta::Property& property, const Value
   for (ReferenceCollection* map : keyedMaps)
     map->recordedInsert(ReferenceCollection::npos, ModelElement(this));
   transaction.commit();
+}
+
+bool ModelElement::Impl::canStoreDirectly(const meta::Property& property) const {
+  if (property->isReadOnly() || property->isSetOnce()) return false;
+  const auto keyedByProperty = [&](const void* via) {
+    const meta::Property map = propertyHandle(via);
+    return map->isMap() && map->getQualifiedBy() == property;
+  };
+  if (container_ != nullptr && keyedByProperty(containmentFeature_)) return false;
+  return std::none_of(incoming_.begin(), incoming_.end(),
+                      [&](const IncomingReference& incoming) { return keyedByProperty(incoming.property); });
+}
+
+Transaction ModelElement::Impl::beginDirectStore(const meta::Property& property) {
+  checkModifiable();
+  Transaction transaction = model_->beginTransaction(false);
+  notifyModifying(property.getIndex());
+  return transaction;
 }
 
 void ModelElement::Impl::setManyValued(const meta::Property& property, const Value& value) {
@@ -376,6 +397,7 @@ ModelElement::Impl::Storage* ModelElement::Impl::recordOldValue(int index) {
   checkModifiable();
   internal::TransactionState& state = *model_->txn_;
   ++state.changeCount;
+  if (watched_) ++model_->watchedChanges_;
   internal::ElementRecord& record = model_->recordFor(this);
   const int level = state.currentLevel();
   if (record.createdLevel == level) return nullptr;
@@ -483,6 +505,7 @@ void ModelElement::Impl::destroy() {
   for (Impl* element : subtree) element->clearOutgoing();
   detachFromContainer();
   for (Impl* element : subtree) {
+    if (element->watched_) ++model_->watchedChanges_;
     internal::ElementRecord& record = model_->recordFor(element);
     model_->txn_->list(record);
     element->state_ = State::Destroyed;

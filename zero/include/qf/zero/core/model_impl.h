@@ -67,6 +67,15 @@ class ModelImpl final : public RefCounted {
   std::vector<ModelElement> getInstances(const meta::Class& metaClass,
                                          query::SearchClassMatchMode mode) const;
 
+  // Changes to watched elements so far (see ModelElement::Impl::setWatched): data derived
+  // from watched elements is stale once this count moves.
+  std::uint64_t getWatchedChangeCount() const noexcept { return watchedChanges_; }
+
+  // Data a library derives from this model and keeps beside it (caches, indexes): one
+  // object per key, made on first request, dropped with the model. The framework never
+  // reads it. A cache that must stay exact watches the elements it was built from.
+  std::shared_ptr<void>& attachment(const void* key) { return attachments_[key]; }
+
   // Proxies. resolveProxy returns the resident element for a proxy, loading it through
   // the proxy loader when one is set; raises "CannotResolveProxy" when neither works.
   // peekResolveProxy never loads and returns a null handle instead of raising. Both
@@ -133,6 +142,8 @@ class ModelImpl final : public RefCounted {
   // Proxies made for elements not resident here; dropped once the element arrives.
   std::unordered_map<Uuid, IntrusivePtr<ModelElement::Impl>, boost::hash<Uuid>> proxies_;
   std::uint64_t nextSerial_ = 1;
+  std::uint64_t watchedChanges_ = 0;
+  std::unordered_map<const void*, std::shared_ptr<void>> attachments_;
   std::unique_ptr<internal::TransactionState> txn_;
   std::vector<std::shared_ptr<ListenerHolderBase>> listeners_;
   ProxyLoader proxyLoader_;

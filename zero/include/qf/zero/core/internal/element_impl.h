@@ -132,6 +132,13 @@ class ModelElement::Impl : public RefCounted {
   // Every property of the class (inherited first), in index order.
   const std::vector<meta::Property>& allProperties() const;
 
+  // Change watching, for a library that keeps data derived from some elements (an index):
+  // it marks them watched, and the model counts every change and destruction of a watched
+  // element (ModelImpl::getWatchedChangeCount), cancelled ones included. The mark is not
+  // part of the element's state: no transaction records it.
+  void setWatched(bool watched) noexcept { watched_ = watched; }
+  bool isWatched() const noexcept { return watched_; }
+
   // Clears every reference of an element that is gone for good (destroyed and committed,
   // or its model deleted), so that no reference cycle keeps memory alive.
   virtual void invalidate();
@@ -164,6 +171,15 @@ class ModelElement::Impl : public RefCounted {
   // (either may be null): the bookkeeping of a raw store to a non-containment reference.
   void relinkIncoming(const ModelElement& oldTarget, const ModelElement& newTarget,
                       const meta::Property& property);
+
+  // The typed setter of an attribute: when canStoreDirectly(property) it may, instead of
+  // assignValue, open beginDirectStore(property), store the new (different) value raw and
+  // commit. False when the property is read-only or set-once, or keys a map that holds
+  // this element: assignValue's checks need the value then.
+  bool canStoreDirectly(const meta::Property& property) const;
+  // Checks that this element may change and records the old value of `property`, inside
+  // the returned transaction (joined when one is open).
+  Transaction beginDirectStore(const meta::Property& property);
 
   // Registers a detached element in `model` under `id` (nil: a fresh UUID), inside the
   // model's open transaction or one of its own.
@@ -206,6 +222,7 @@ class ModelElement::Impl : public RefCounted {
   internal::ElementRecord* record_ = nullptr;  // while the model's transaction touches it
   std::uint64_t serial_ = 0;
   State state_ = State::Detached;
+  bool watched_ = false;
   std::u16string proxyModelUri_;
   std::vector<IncomingReference> incoming_;
 };
