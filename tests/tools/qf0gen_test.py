@@ -102,6 +102,14 @@ class RefusedDescriptions(unittest.TestCase):
                            "class Item, property name", "doc is a string or a list of strings")
         self.assertRefused(lambda d: cls(d, "Shop").update(doc=["one", 2]), "class Shop", "doc is a string")
 
+    def test_only_a_single_json_value_is_held_as_text(self):
+        self.assertRefused(lambda d: prop(d, "Item", "name").update(heldAsText=True),
+                           "class Item, property name", "heldAsText is true or false")
+        self.assertRefused(lambda d: prop(d, "Item", "name").update(type="JsonValue", kind="sequence", heldAsText=True),
+                           "class Item, property name", "only for a single JsonValue")
+        self.assertRefused(lambda d: prop(d, "Item", "name").update(type="JsonValue", heldAsText="yes"),
+                           "class Item, property name", "heldAsText is true or false")
+
     def test_indexes_continue_after_the_superclass(self):
         self.assertRefused(lambda d: prop(d, "Item", "price").update(index=3),
                            "class Item, property price", "index 3, expected 2")

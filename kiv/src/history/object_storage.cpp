@@ -17,8 +17,18 @@ namespace {
 
 using qf::zero::io::JSONConstants;
 
-// Compact, without ASCII escaping: equal contents give byte-identical texts.
-std::string compactText(const qf::zero::JsonValue& content) { return content.dump(-1, ' ', false); }
+// The serializer that captures elements for the storages of one history model, kept
+// beside it: it learns each user class once, not once per capture.
+qf::zero::io::JSONSerializer& captureSerializer(qf::zero::ModelImpl& model) {
+  static const int key = 0;  // its address names the attachment; the object is immutable
+  std::shared_ptr<void>& slot = model.attachment(&key);
+  if (!slot) {
+    auto serializer = std::make_shared<qf::zero::io::JSONSerializer>();
+    serializer->getCustomizer().setShouldSkipDefaultValues(false);
+    slot = serializer;
+  }
+  return *static_cast<qf::zero::io::JSONSerializer*>(slot.get());
+}
 
 }  // namespace
 
@@ -26,11 +36,8 @@ std::string compactText(const qf::zero::JsonValue& content) { return content.dum
 // every property of an element that is refreshed in place.
 ObjectStorage ObjectStorage::Impl::setContent(const qf::zero::ModelElement& element) {
   history::requireLive(element, u"kiv.ObjectStorage.setContent");
-  qf::zero::io::JSONSerializer serializer;
-  serializer.getCustomizer().setShouldSkipDefaultValues(false);
-  qf::zero::JsonValue entry = serializer.writeEntry(element);
-
   qf::zero::Transaction transaction = history::beginTransactionOn(*this);
+  qf::zero::JsonValue entry = captureSerializer(*getModelImpl()).writeEntry(element);
   const auto& elementUuidProperty = MetaPackageKiv::getInstance().getObjectStorage_elementUUID();
   // elementUUID is read-only to users; the storage itself names the element it holds.
   assignValue(elementUuidProperty,
@@ -48,7 +55,7 @@ qf::zero::ModelElement ObjectStorage::Impl::instantiate(const qf::zero::Model& m
   qf::zero::JsonValue document = qf::zero::JsonValue::object();
   document[JSONConstants::VERSION_ATTR] = JSONConstants::FORMAT_VERSION;
   document[JSONConstants::ENTRIES_ATTR] = qf::zero::JsonValue::array();
-  document[JSONConstants::ENTRIES_ATTR].push_back(content_);
+  document[JSONConstants::ENTRIES_ATTR].push_back(content_.parse());
   qf::zero::io::JSONParser parser(std::make_unique<qf::zero::io::ParseCustomizer>(),
                                   std::make_unique<ElementReuseModelBuilder>());
   parser.parseVerbatim(document, model);
@@ -58,7 +65,7 @@ qf::zero::ModelElement ObjectStorage::Impl::instantiate(const qf::zero::Model& m
 bool ObjectStorage::Impl::isEqual(const ObjectStorage& other) const {
   if (!history::isLive(other) || other.getUuid() != getUuid()) return false;
   if (other->elementUUID_ != elementUUID_) return false;
-  return other.getImpl() == this || compactText(other->content_) == compactText(content_);
+  return other.getImpl() == this || other->content_ == content_;
 }
 
 }  // namespace kiv

@@ -38,7 +38,7 @@ TEST_F(ObjectStorages, SetContentStoresTheWholeEntryDefaultsIncluded) {
   EXPECT_EQ(storage.setContent(gadget), storage);
   EXPECT_EQ(storage.getElementUUID(), gadget.getUuid());
   EXPECT_EQ(storage.getContent(), fullEntryOf(gadget));
-  const JsonValue& content = storage.getContent().at("content");
+  const JsonValue content = storage.getContent().at("content");
   EXPECT_EQ(content.at("count"), 7) << "a default value is written too";
   EXPECT_EQ(content.at("flag"), true);
   EXPECT_EQ(content.at("tags"), JsonValue::array());
@@ -63,6 +63,12 @@ TEST_F(ObjectStorages, SetContentOfNoElementRaisesAndChangesNothing) {
   ModelElement gone = gadgetNamed(u"gone");
   gone.destroy();
   EXPECT_THROW(storage.setContent(gone), Exception<qf0::messages::ElementRequired>);
+  // Content is held as text: a string that is not UTF-8 has none.
+  EXPECT_THROW(storage->setContent(JsonValue{{"name", std::string("\xff")}}),
+               Exception<qf0::messages::InvalidValue>);
+  ModelElement odd = gadgetNamed(u"odd");
+  odd.setPropertyValue(tm.note, qf::zero::Value::of(JsonValue{{"bytes", std::string("\xc3")}}));
+  EXPECT_THROW(storage.setContent(odd), Exception<qf0::messages::InvalidValue>);
   EXPECT_EQ(support::dumpModel(repository), before);
   EXPECT_EQ(storage.getContent(), fullEntryOf(gadget));
 }

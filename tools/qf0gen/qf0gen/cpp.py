@@ -47,6 +47,8 @@ def collection_alias(prop):
 
 
 def member_type(prop):
+    if getattr(prop, "held_as_text", False):
+        return "qf::zero::JsonText"
     if prop.many:
         return collection_alias(prop)
     if prop.kind == "optional" and not prop.is_reference:
@@ -56,11 +58,15 @@ def member_type(prop):
 
 def param(prop):
     """Parameter type of a setter of a single-valued property."""
+    if getattr(prop, "held_as_text", False):
+        return f"const {value_type(prop.type)}&"
     mt = member_type(prop)
     return mt if by_value(prop.type) and prop.kind != "optional" else f"const {mt}&"
 
 
 def getter_return(prop, in_handle=False):
+    if getattr(prop, "held_as_text", False):
+        return value_type(prop.type)  # parsed from the held text on each call
     if prop.many:
         return f"const {collection_type(prop) if in_handle else collection_alias(prop)}&"
     if prop.is_reference or by_value(prop.type):

@@ -221,7 +221,7 @@ class Property:
         where = f"{where}, property {self.name}"
         _check_keys(where, data, {"name", "index", "kind", "type", "composite", "ordered", "unique", "readOnly",
                                   "setOnce", "transient", "publicAccessor", "publicMutator", "default", "opposite",
-                                  "key", "doc"})
+                                  "key", "doc", "heldAsText"})
         self.doc = _doc(where, data)
         self.where = where
         self.index = data.get("index")
@@ -238,6 +238,10 @@ class Property:
         self.public_accessor = data.get("publicAccessor", True)
         self.public_mutator = data.get("publicMutator", True)
         self.default = data.get("default")
+        self.held_as_text = data.get("heldAsText", False)
+        if self.held_as_text is not False and (self.held_as_text is not True or self.kind != "single"
+                                               or self.type.cpp != "qf::zero::JsonValue"):
+            _fail(where, "heldAsText is true or false, and true only for a single JsonValue")
         self.opposite_name = data.get("opposite")
         self.key_name = data.get("key")
         self.opposite = None

@@ -49,6 +49,8 @@ def _type_includes(d, cls, for_impl):
             includes.update(t.includes)
         if t.kind == "enum" or (for_impl and t.kind == "datatype"):
             includes.add(f'"{files.header(d, t)}"')
+        if for_impl and any(q.type is t and q.held_as_text for q in cls.properties):
+            includes.add('"qf/zero/core/json_text.h"')
         if for_impl and t.cpp == "qf::zero::JsonValue":
             # A member needs the whole type; a declaration of an operation does not.
             includes.add("<nlohmann/json.hpp>" if t in member_types else "<nlohmann/json_fwd.hpp>")
@@ -370,6 +372,8 @@ def _accessors(d, cls, p):
     if p.is_reference:
         lines += [f"{getter_return(p)} {n}::Impl::get{p.cap}() const {{",
                   f"  return {m}.isProxy() ? {QZ}::elementCast<{p.type.cpp}>(residentOf({m})) : {m};", "}"]
+    elif p.held_as_text:
+        lines += [f"{getter_return(p)} {n}::Impl::get{p.cap}() const {{ return {m}.parse(); }}"]
     else:
         lines += [f"{getter_return(p)} {n}::Impl::get{p.cap}() const {{ return {m}; }}"]
     if p.is_reference:
@@ -378,6 +382,14 @@ def _accessors(d, cls, p):
         value = f"value ? {QZ}::Value::createPrimitiveValue(property, *value) : {QZ}::Value()"
     else:
         value = f"{QZ}::Value::createPrimitiveValue(property, value)"
+    if p.held_as_text:
+        lines += ["", f"void {n}::Impl::set{p.cap}({param(p)} value) {{", "  checkNotProxy();",
+                  f"  {QZ}::JsonText text(value);", f"  if ({m} == text) return;", f"  const auto& property = {getter};",
+                  "  if (!canStoreDirectly(property)) {", f"    assignValue(property, {value}, false);",
+                  "    return;", "  }", f"  {QZ}::Transaction transaction = beginDirectStore(property);",
+                  f"  {m} = std::move(text);", "  transaction.commit();", "}", "",
+                  f"void {n}::Impl::basicSet{p.cap}({param(p)} value) {{", f"  {m} = {QZ}::JsonText(value);", "}", ""]
+        return lines
     lines += ["", f"void {n}::Impl::set{p.cap}({param(p)} value) {{", "  checkNotProxy();",
               f"  if ({m} == value) return;", f"  const auto& property = {getter};"]
     if p.is_reference or p.kind == "optional":

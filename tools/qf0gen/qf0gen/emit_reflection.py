@@ -3,7 +3,7 @@ old-value slots."""
 
 from . import files
 from .emit_class import json_include, referenced_impl_includes
-from .cpp import impl_base, member, member_type, ns_close, ns_open, package_getter
+from .cpp import impl_base, member, member_type, ns_close, ns_open, package_getter, value_type
 
 QZ = "qf::zero"
 
@@ -18,6 +18,8 @@ def _wrap(p, expr):
         return f"{QZ}::Value::createElementValue({expr}, property)"
     if p.kind == "optional":
         return f"{expr} ? {QZ}::Value::createPrimitiveValue(property, *{expr}) : {QZ}::Value()"
+    if p.held_as_text:
+        return f"{QZ}::Value::createPrimitiveValue(property, {expr}.parse())"
     return f"{QZ}::Value::createPrimitiveValue(property, {expr})"
 
 
@@ -55,7 +57,7 @@ def reflection_source(d, cls):
     lines += _dispatch(d, cls, single, lambda p: [f"return {_wrap(p, member(p))};"],
                        _no_such_property(cls, "basicGetValue(property)"))
     lines += ["}", "", f"void {n}::Impl::basicSetValue(const {QZ}::meta::Property& property, const {QZ}::Value& value) {{"]
-    lines += _dispatch(d, cls, single, lambda p: [f"basicSet{p.cap}(value.getValue<{member_type(p)}>());", "return;"],
+    lines += _dispatch(d, cls, single, lambda p: [f"basicSet{p.cap}(value.getValue<{value_type(p.type) if p.held_as_text else member_type(p)}>());", "return;"],
                        ("  (void)value;\n" if cls.superclass is None else "")
                        + _no_such_property(cls, "basicSetValue(property, value)").replace("  return ", "  "))
     lines += ["}", "",
@@ -80,7 +82,10 @@ def reflection_source(d, cls):
     if single:
         lines += ["  if (!collections) {", "    auto* typed = static_cast<Storage*>(storage);"]
         for p in single:
-            lines.append(f"    if (typed->isChanged({p.index})) basicSet{p.cap}(typed->{member(p)});")
+            if p.held_as_text:
+                lines.append(f"    if (typed->isChanged({p.index})) {member(p)} = typed->{member(p)};")
+            else:
+                lines.append(f"    if (typed->isChanged({p.index})) basicSet{p.cap}(typed->{member(p)});")
         lines.append("  }")
     lines += [f"  {base}::restoreFromStorage(storage, collections);", "}", ""]
     lines += _convert_references(cls)
