@@ -8,6 +8,8 @@
 
 #include <nlohmann/json.hpp>
 
+#include <cctype>
+#include <random>
 #include <set>
 
 namespace qf::zero {
@@ -78,6 +80,25 @@ TEST(Uuids, FreshOnesAreVersionFourAndDistinctNameBasedOnesAreStable) {
   EXPECT_EQ(parseUuid("{" + toText(id) + "}"), id);
   EXPECT_FALSE(parseUuid("0b2c3d4e-0000-4000-8000-00000000abcg"));
   EXPECT_FALSE(parseUuid(""));
+}
+
+// On seeded random UUIDs: the text of a UUID parses back to it in either case, and any
+// one character replaced by a character out of place (a dash for a digit, a digit for a
+// dash, a letter beyond f) is refused.
+TEST(Uuids, ParseTakesExactlyTheCanonicalForm) {
+  std::mt19937 random(7);
+  for (int i = 0; i < 500; ++i) {
+    const Uuid id = generateNewUuid();
+    std::string text = toText(id);
+    ASSERT_EQ(parseUuid(text), id) << text;
+    std::string upper = text;
+    for (char& c : upper) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
+    ASSERT_EQ(parseUuid(upper), id) << upper;
+    const auto at = std::uniform_int_distribution<std::size_t>(0, text.size() - 1)(random);
+    text[at] = text[at] == '-' ? 'a' : (i % 2 == 0 ? '-' : 'g');
+    EXPECT_FALSE(parseUuid(text)) << text;
+    EXPECT_FALSE(parseUuid(text.substr(1))) << "too short";
+  }
 }
 
 }  // namespace

@@ -178,13 +178,16 @@ void ModelElement::Impl::assignValue(const meta::Property& property, const Value
     setManyValued(property, value);
     return;
   }
-  checkAssignable(property, value);
   if (property->isReference()) {
+    checkAssignable(property, value);
     setSingleReference(property, value.getElement(), initializing);
     return;
   }
+  // An attribute that keeps its value needs no further check: refreshing an element in
+  // place sets mostly such values.
   const Value current = basicGetValue(property);
   if (current == value) return;
+  checkAssignable(property, value);
   if (property->isSetOnce() && !initializing && !current.isEmpty() &&
       !(current == property->getDefaultValue())) {
     reportException(qf0::messages::CannotSetSetOnceProperty(property.getQualifiedName()));

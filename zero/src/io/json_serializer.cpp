@@ -74,9 +74,11 @@ class JSONSerializer::EntryWriter {
   ordered_json write(const ModelElement& element) {
     const ClassPlan& plan = planFor(element.getMetaClass());
     ordered_json entry = ordered_json::object();
+    entry.get_ref<ordered_json::object_t&>().reserve(3);
     entry[JSONConstants::TYPE_ATTR] = plan.typeName;
     entry[JSONConstants::ID_ATTR] = element.identifier();
     ordered_json& content = entry[JSONConstants::CONTENT_ATTR] = ordered_json::object();
+    content.get_ref<ordered_json::object_t&>().reserve(plan.properties.size());
     for (const PropertyPlan& property : plan.properties) writeProperty(*element.getImpl(), property, content);
     return entry;
   }
