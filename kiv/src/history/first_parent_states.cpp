@@ -60,9 +60,19 @@ void FirstParentStates::extendTo(const Commit& tip) {
   states_.clear();
 }
 
+// The marks of the previous line go as far as its parents still lead; a mark left behind
+// on a line that was changed only costs a needless rebuild later.
+void FirstParentStates::unwatchLine() {
+  for (qf::zero::ModelElement commit = tip_; commit && commit.isLive() && commit->isWatched();) {
+    commit->setWatched(false);
+    const Commit typed = qf::zero::elementCast<Commit>(commit);
+    if (const Delta delta = typed->getDelta()) delta->setWatched(false);
+    commit = heldFirstParent(typed);
+  }
+}
+
 void FirstParentStates::rebuild(const Commit& tip) {
-  for (qf::zero::ModelElement& element : watched_) element->setWatched(false);
-  watched_.clear();
+  unwatchLine();
   states_.clear();
   tip_ = tip;
   usable_ = true;
@@ -99,9 +109,6 @@ bool FirstParentStates::absorb(const Commit& commit, bool nearest) {
   return true;
 }
 
-void FirstParentStates::watch(const qf::zero::ModelElement& element) {
-  element->setWatched(true);
-  watched_.push_back(element);
-}
+void FirstParentStates::watch(const qf::zero::ModelElement& element) { element->setWatched(true); }
 
 }  // namespace kiv::history

@@ -49,12 +49,12 @@ class FirstParentStates {
   // farther. False when the delta holds an entry that is not a resident storage.
   bool absorb(const Commit& commit, bool nearest);
   void watch(const qf::zero::ModelElement& element);
+  void unwatchLine();
 
   Commit tip_;
   Commit lastMiss_;                // the tip of the last question the index could not take
   bool usable_ = false;            // false: the tip's line holds a proxy
   std::uint64_t seenChanges_ = 0;  // the model's watched-change count when last in step
-  std::vector<qf::zero::ModelElement> watched_;
   std::unordered_map<qf::zero::Uuid, ObjectStorage, boost::hash<qf::zero::Uuid>> states_;
 };
 

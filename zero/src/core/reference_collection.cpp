@@ -166,16 +166,15 @@ bool ReferenceCollection::rawEraseAt(std::size_t position) {
   return true;
 }
 
+// The edit is logged only when this level keeps a log: an element made at this level, the
+// common case while a history is recorded, pays for no key or value.
 bool ReferenceCollection::recordedInsert(std::size_t position, const ModelElement& element) {
   std::vector<CollectionEdit>* log = modifying();
   const std::size_t at = isPositional() && position < size() ? position : size();
-  CollectionEdit edit{CollectionEdit::Kind::Inserted, at, Value(), MapKey()};
-  if (property_->isMap()) edit.key = keyOf(element);
+  if (log == nullptr) return rawInsert(at, element);
+  const MapKey key = property_->isMap() ? keyOf(element) : MapKey();
   if (!rawInsert(at, element)) return false;
-  if (log != nullptr) {
-    edit.item = Value::of(element);
-    log->push_back(std::move(edit));
-  }
+  log->push_back({CollectionEdit::Kind::Inserted, at, Value::of(element), key});
   return true;
 }
 
@@ -183,18 +182,17 @@ bool ReferenceCollection::recordedErase(const ModelElement::Impl* element) {
   if (!basicContains(element)) return false;
   std::vector<CollectionEdit>* log = modifying();
   const ModelElement handle(const_cast<ModelElement::Impl*>(element));
-  CollectionEdit edit{CollectionEdit::Kind::Erased, 0, Value(), MapKey()};
+  std::size_t position = 0;
+  MapKey key;
   if (isPositional()) {
-    edit.position = basicIndexOf(element).value_or(0);
-    rawEraseAt(edit.position);
+    position = basicIndexOf(element).value_or(0);
+    rawEraseAt(position);
   } else {
-    if (property_->isMap()) edit.key = keyOf(handle);
+    if (log != nullptr && property_->isMap()) key = keyOf(handle);
     rawErase(element);
   }
-  if (log != nullptr) {
-    edit.item = Value::of(handle);
-    log->push_back(std::move(edit));
-  }
+  if (log != nullptr)
+    log->push_back({CollectionEdit::Kind::Erased, position, Value::of(handle), std::move(key)});
   return true;
 }
 
