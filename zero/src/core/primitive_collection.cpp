@@ -132,14 +132,7 @@ void PrimitiveCollection::undo(const std::vector<CollectionEdit>& edits) {
 
 std::vector<Value> PrimitiveCollection::contentsBefore(const std::vector<CollectionEdit>& edits) const {
   std::vector<Value> items = getAllValues();
-  for (auto edit = edits.rbegin(); edit != edits.rend(); ++edit) {
-    const auto at = static_cast<std::ptrdiff_t>(std::min(edit->position, items.size()));
-    if (edit->kind == CollectionEdit::Kind::Erased) {
-      items.insert(items.begin() + at, edit->item);
-    } else if (edit->position < items.size()) {
-      items.erase(items.begin() + at);
-    }
-  }
+  undoInSequence(items, edits);
   return items;
 }
 

@@ -299,14 +299,7 @@ void ReferenceCollection::undo(const std::vector<CollectionEdit>& edits) {
 std::vector<Value> ReferenceCollection::contentsBefore(const std::vector<CollectionEdit>& edits) const {
   std::vector<Value> items = snapshot();
   if (isPositional()) {
-    for (auto edit = edits.rbegin(); edit != edits.rend(); ++edit) {
-      const auto at = static_cast<std::ptrdiff_t>(std::min(edit->position, items.size()));
-      if (edit->kind == CollectionEdit::Kind::Erased) {
-        items.insert(items.begin() + at, edit->item);
-      } else if (edit->position < items.size()) {
-        items.erase(items.begin() + at);
-      }
-    }
+    undoInSequence(items, edits);
     return items;
   }
   // A set or map holds an item at most once: it was there before the edits when its

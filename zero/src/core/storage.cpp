@@ -2,9 +2,22 @@
 
 #include "qf/zero/core/owned_collection.h"
 
+#include <algorithm>
 #include <iterator>
 
 namespace qf::zero {
+
+void undoInSequence(std::vector<Value>& items, const std::vector<ModelElement::Impl::CollectionEdit>& edits) {
+  using Kind = ModelElement::Impl::CollectionEdit::Kind;
+  for (auto edit = edits.rbegin(); edit != edits.rend(); ++edit) {
+    const auto at = static_cast<std::ptrdiff_t>(std::min(edit->position, items.size()));
+    if (edit->kind == Kind::Erased) {
+      items.insert(items.begin() + at, edit->item);
+    } else if (edit->position < items.size()) {
+      items.erase(items.begin() + at);
+    }
+  }
+}
 
 ModelElement::Impl::Storage::Storage(const Uuid& id, const Model&, const meta::Class& metaClass, int count)
     : uuid_(id), metaClass_(metaClass), changed_(static_cast<std::size_t>(count + 63) / 64 + 1, 0) {}

@@ -40,6 +40,10 @@ struct ModelElement::Impl::CollectionEdit {
   MapKey key;
 };
 
+// Takes `edits` back from `items`, the contents of a positional collection, last edit
+// first: what the contents were before the edits.
+void undoInSequence(std::vector<Value>& items, const std::vector<ModelElement::Impl::CollectionEdit>& edits);
+
 class ModelElement::Impl::Storage {
  public:
   Storage(const Uuid& id, const Model& model, const meta::Class& metaClass, int count);
