@@ -23,7 +23,6 @@
 #include <cstdint>
 #include <optional>
 #include <unordered_map>
-#include <vector>
 
 namespace qf::zero {
 class ModelImpl;
