@@ -2,7 +2,7 @@
 //
 // This header gives the whole public API: kiv's element classes (generated from
 // kiv/metamodel/kiv_metamodel.json into <build>/kiv/generated/include/kiv/metamodel/),
-// its message catalog, the merge interfaces, and the parts of the qf::zero framework
+// its message catalog, the merge strategies and tools, and the parts of the qf::zero framework
 // every caller needs (models, transactions, elements, values). Each class documents its
 // contract in its own header; an operation that raises leaves its model as it was.
 //
@@ -29,8 +29,13 @@
 #pragma once
 
 #include "kiv/history/element_reuse_model_builder.h"
+#include "kiv/merge/accept_theirs_merge_strategy.h"
+#include "kiv/merge/accept_theirs_merge_tool.h"
+#include "kiv/merge/default_merge_strategy.h"
+#include "kiv/merge/merge3_strategy.h"
 #include "kiv/merge/merge_strategy.h"
 #include "kiv/merge/merge_tool.h"
+#include "kiv/merge/recursive_merge3_strategy.h"
 #include "kiv/messages/messages.h"
 #include "kiv/metamodel/branch_impl.h"
 #include "kiv/metamodel/commit_impl.h"
