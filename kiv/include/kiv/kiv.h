@@ -35,6 +35,7 @@
 #include "kiv/merge/merge3_strategy.h"
 #include "kiv/merge/merge_strategy.h"
 #include "kiv/merge/merge_tool.h"
+#include "kiv/merge/property_merge_tool.h"
 #include "kiv/merge/recursive_merge3_strategy.h"
 #include "kiv/messages/messages.h"
 #include "kiv/metamodel/branch_impl.h"
