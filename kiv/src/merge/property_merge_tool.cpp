@@ -101,6 +101,10 @@ class ElementSettler {
 
 JsonValue contentOrNull(const ObjectStorage& storage) { return storage ? storage.getContent() : JsonValue(); }
 
+bool sameContent(const ObjectStorage& storage, const ObjectStorage& base) {
+  return base && storage.getContent() == base.getContent();
+}
+
 }  // namespace
 
 std::string_view toString(ConflictKind kind) {
@@ -157,10 +161,12 @@ Delta PropertyMergeTool::run(const Commit& ancestor, const Commit&, const Commit
       const JsonValue baseEntry = contentOrNull(base);
       state.put(uuid, settler.bothChanged(uuid, base ? &baseEntry : nullptr, o.getContent(), t.getContent()),
                 {o, t});
-    } else if (o || t) {
+    } else if (const ObjectStorage kept = o ? o : t; kept && !sameContent(kept, base)) {
       settler.deleteModify(uuid, contentOrNull(base), contentOrNull(o), contentOrNull(t));
-      state.put(uuid, (o ? o : t).getContent(), {o ? o : t});
+      state.put(uuid, kept.getContent(), {kept});
     } else if (base && !presentEntry(merged.getPrevious(), uuid)) {
+      // Deleted on one side; the other stored it again as it was (a transient property
+      // changed, say), which changes nothing that a deletion would lose.
       merged.getPreviousMutable().add(base);
     }
   }
