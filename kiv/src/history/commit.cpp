@@ -1,4 +1,5 @@
 #include "history/ancestry.h"
+#include "history/composed_state.h"
 #include "history/first_parent_states.h"
 #include "history/history_support.h"
 #include "kiv/messages/messages.h"
@@ -122,22 +123,37 @@ ObjectStorage Commit::Impl::find(const qf::zero::Uuid& uuid) const {
 // empty scratch delta that does not outlive the call.
 Delta Commit::Impl::getSnapshot() const {
   qf::zero::Transaction transaction = history::beginTransactionOn(*this);
+  std::vector<Delta> deltas = history::snapshotDeltas(self(this));
   Delta scratch;
-  std::vector<Delta> deltas{getDelta()};
   if (!history::isLive(deltas.front())) deltas.front() = scratch = Delta::create(getModel());
-  for (Commit commit = self(this); !commit->isInitial();) {
-    const Delta delta = commit->getDelta();
-    if (history::isLive(delta) && delta->getIsSnapshot()) break;
-    commit = commit->getParent();
-    if (!commit) break;
-    deltas.push_back(commit->getDelta());
-  }
   const Delta snapshot = Delta::Impl::compose(deltas);
   snapshot->setIsSnapshot(true);
   if (scratch) scratch.destroy();
   transaction.commit();
   return snapshot;
 }
+
+namespace history {
+
+std::vector<Delta> snapshotDeltas(const Commit& commit) {
+  std::vector<Delta> deltas{commit->getDelta()};
+  for (Commit at = commit; !at->isInitial();) {
+    const Delta delta = at->getDelta();
+    if (isLive(delta) && delta->getIsSnapshot()) break;
+    at = at->getParent();
+    if (!at) break;
+    deltas.push_back(at->getDelta());
+  }
+  return deltas;
+}
+
+ComposedState snapshotState(const Commit& commit) {
+  ComposedState state = composeState(snapshotDeltas(commit));
+  state.isSnapshot = true;
+  return state;
+}
+
+}  // namespace history
 
 // The change from the state at `other` to the state at this commit. Without a path back
 // to `other` it goes from other's state through nothing: this snapshot composed with the

@@ -1,4 +1,5 @@
 // Delta::compose: one delta for a sequence of deltas, most recent first.
+#include "history/composed_state.h"
 #include "history/history_support.h"
 #include "kiv/messages/messages.h"
 #include "kiv/metamodel/delta_impl.h"
@@ -7,6 +8,7 @@
 
 #include <algorithm>
 #include <unordered_map>
+#include <unordered_set>
 
 namespace kiv {
 
@@ -18,19 +20,34 @@ using qf::zero::Uuid;
 
 // For every element of the sequence: the most recent position at which it is deleted and
 // the oldest at which it is created. "No more recent delta deletes it" and "no older delta
-// creates it" then cost one lookup instead of a walk over the sequence.
+// creates it" then cost one lookup instead of a walk over the sequence. Creations matter
+// only for elements that some delta holds a "before" of, so only theirs are kept: a long
+// history's initial delta creates every element, and most are never asked about.
 class Lifecycles {
  public:
   explicit Lifecycles(const std::vector<Delta>& deltas) {
+    std::unordered_set<Uuid, boost::hash<Uuid>> withPrevious;
     for (std::size_t position = 0; position < deltas.size(); ++position) {
       if (!history::isLive(deltas[position])) continue;
       const Delta::Impl& delta = *deltas[position].getImpl();
       forEachPresent(delta.getPrevious(), [&](const Uuid& uuid, const ObjectStorage&) {
+        withPrevious.insert(uuid);
         if (!presentEntry(delta.getCurrent(), uuid)) mostRecentDeletion_.try_emplace(uuid, position);
       });
-      forEachPresent(delta.getCurrent(), [&](const Uuid& uuid, const ObjectStorage&) {
-        if (!presentEntry(delta.getPrevious(), uuid)) oldestCreation_[uuid] = position;
-      });
+    }
+    if (withPrevious.empty()) return;
+    for (std::size_t position = 0; position < deltas.size(); ++position) {
+      if (!history::isLive(deltas[position])) continue;
+      const Delta::Impl& delta = *deltas[position].getImpl();
+      for (const auto& [key, held] : delta.getCurrent().container()) {
+        // A live entry is filed under its element's UUID, a proxy under the nil UUID.
+        if (!key.is_nil() && withPrevious.count(key) == 0) continue;
+        const ObjectStorage storage = held.isLive() ? held : history::residentOf(delta.getCurrent(), held);
+        if (!storage) continue;
+        const Uuid uuid = held.isLive() ? key : storage.getElementUUID().value_or(key);
+        if (withPrevious.count(uuid) != 0 && !presentEntry(delta.getPrevious(), uuid))
+          oldestCreation_[uuid] = position;
+      }
     }
   }
 
@@ -58,45 +75,108 @@ const Delta& firstLive(const std::vector<Delta>& deltas) {
   return *live;
 }
 
-}  // namespace
+// The result of a composition, written either into a new delta or into plain maps.
+class DeltaSink {
+ public:
+  explicit DeltaSink(Delta::Impl& delta)
+      : delta_(delta), current_(delta.getCurrentMutable()), previous_(delta.getPreviousMutable()) {}
+  ObjectStorage current(const Uuid& uuid) const { return presentEntry(current_, uuid); }
+  bool hasPrevious(const Uuid& uuid) const { return static_cast<bool>(presentEntry(previous_, uuid)); }
+  void addCurrentUnlessPresent(const Uuid& uuid, const ObjectStorage& storage) {
+    if (!current(uuid)) current_.add(storage);
+  }
+  void removeCurrent(const Uuid&, const ObjectStorage& storage) { current_.remove(storage); }
+  void addPrevious(const Uuid&, const ObjectStorage& storage) { previous_.add(storage); }
+  void markSnapshot() { delta_.setIsSnapshot(true); }
+
+ private:
+  Delta::Impl& delta_;
+  history::StorageMap& current_;
+  history::StorageMap& previous_;
+};
+
+class StateSink {
+ public:
+  explicit StateSink(history::ComposedState& state) : state_(state) {}
+  ObjectStorage current(const Uuid& uuid) const { return state_.currentOf(uuid); }
+  bool hasPrevious(const Uuid& uuid) const { return state_.previous.count(uuid) != 0; }
+  void addCurrentUnlessPresent(const Uuid& uuid, const ObjectStorage& storage) {
+    state_.current.try_emplace(uuid, storage);
+  }
+  void removeCurrent(const Uuid& uuid, const ObjectStorage&) { state_.current.erase(uuid); }
+  void addPrevious(const Uuid& uuid, const ObjectStorage& storage) { state_.previous.emplace(uuid, storage); }
+  void markSnapshot() { state_.isSnapshot = true; }
+
+ private:
+  history::ComposedState& state_;
+};
 
 // Positions run from 0 (the latest change) to n-1 (the oldest). For each i, the currents
 // of delta i are taken newest first (a), then the previouses of delta n-1-i oldest first
 // (b). The identity test in (b) sees the result's currents as (a) has left them so far,
 // so the outcome depends on this interleaving: an element whose oldest "before" is the
 // very storage that is its newest "after" ends as it began and drops out.
-Delta Delta::Impl::compose(const std::vector<Delta>& deltas) {
-  const Delta& first = firstLive(deltas);
+template <class Sink>
+void composeInto(const std::vector<Delta>& deltas, Sink& sink) {
   const Lifecycles lifecycles(deltas);
   const std::size_t n = deltas.size();
-
-  qf::zero::Transaction transaction = history::beginTransactionOn(*first.getImpl());
-  const Delta result = Delta::create(first.getModel());
-  Impl& composed = *result.getImpl();
-  CurrentCollection& current = composed.getCurrentMutable();
-  PreviousCollection& previous = composed.getPreviousMutable();
   for (std::size_t i = 0; i < n; ++i) {
     if (history::isLive(deltas[i])) {
-      forEachPresent(deltas[i]->current_, [&](const Uuid& uuid, const ObjectStorage& storage) {
-        if (!presentEntry(current, uuid) && !lifecycles.deletedMoreRecentlyThan(uuid, i))
-          current.add(storage);
+      forEachPresent(deltas[i]->getCurrent(), [&](const Uuid& uuid, const ObjectStorage& storage) {
+        if (!lifecycles.deletedMoreRecentlyThan(uuid, i)) sink.addCurrentUnlessPresent(uuid, storage);
       });
     }
     const std::size_t older = n - 1 - i;
     if (history::isLive(deltas[older])) {
-      forEachPresent(deltas[older]->previous_, [&](const Uuid& uuid, const ObjectStorage& storage) {
-        if (presentEntry(previous, uuid) || lifecycles.createdEarlierThan(uuid, older)) return;
-        if (presentEntry(current, uuid) == storage) {
-          current.remove(storage);
+      forEachPresent(deltas[older]->getPrevious(), [&](const Uuid& uuid, const ObjectStorage& storage) {
+        if (sink.hasPrevious(uuid) || lifecycles.createdEarlierThan(uuid, older)) return;
+        if (sink.current(uuid) == storage) {
+          sink.removeCurrent(uuid, storage);
         } else {
-          previous.add(storage);
+          sink.addPrevious(uuid, storage);
         }
       });
     }
-    if (history::isLive(deltas[i]) && deltas[i]->isSnapshot_) composed.setIsSnapshot(true);
+    if (history::isLive(deltas[i]) && deltas[i]->getIsSnapshot()) sink.markSnapshot();
   }
+}
+
+}  // namespace
+
+Delta Delta::Impl::compose(const std::vector<Delta>& deltas) {
+  const Delta& first = firstLive(deltas);
+  qf::zero::Transaction transaction = history::beginTransactionOn(*first.getImpl());
+  const Delta result = Delta::create(first.getModel());
+  DeltaSink sink(*result.getImpl());
+  composeInto(deltas, sink);
   transaction.commit();
   return result;
 }
+
+namespace history {
+
+ObjectStorage ComposedState::currentOf(const Uuid& uuid) const {
+  const auto it = current.find(uuid);
+  return it != current.end() ? it->second : ObjectStorage();
+}
+
+ObjectStorage ComposedState::previousOf(const Uuid& uuid) const {
+  const auto it = previous.find(uuid);
+  return it != previous.end() ? it->second : ObjectStorage();
+}
+
+ComposedState composeState(const std::vector<Delta>& deltas) {
+  ComposedState state;
+  std::size_t largest = 0;
+  for (const Delta& delta : deltas) {
+    if (isLive(delta)) largest = std::max(largest, delta->getCurrent().size());
+  }
+  state.current.reserve(largest);
+  StateSink sink(state);
+  composeInto(deltas, sink);
+  return state;
+}
+
+}  // namespace history
 
 }  // namespace kiv

@@ -1,4 +1,5 @@
 // Merge3Strategy::diff3: the element-by-element comparison of three snapshots.
+#include "history/composed_state.h"
 #include "history/history_support.h"
 #include "kiv/merge/merge3_strategy.h"
 #include "kiv/metamodel/commit_impl.h"
@@ -8,8 +9,7 @@ namespace kiv {
 
 namespace {
 
-using history::presentEntry;
-using history::StorageMap;
+using history::ComposedState;
 using qf::zero::Uuid;
 
 // The three result deltas, filled through their maps inside the comparison's one
@@ -47,12 +47,13 @@ class Diff3Result {
   Delta merged_, ours_, theirs_;
 };
 
-// Step one: every element of the base, by what each side did to it.
-void compareBaseElements(const Delta::Impl& base, const StorageMap& ours, const StorageMap& theirs,
+// Step one: every element of the base, by what each side did to it. Each element is
+// settled on its own, so the maps are walked in any order.
+void compareBaseElements(const ComposedState& base, const ComposedState& ours, const ComposedState& theirs,
                          Diff3Result& result) {
-  history::forEachPresent(base.getCurrent(), [&](const Uuid& uuid, const ObjectStorage& b) {
-    const ObjectStorage o = presentEntry(ours, uuid);
-    const ObjectStorage t = presentEntry(theirs, uuid);
+  for (const auto& [uuid, b] : base.current) {
+    const ObjectStorage o = ours.currentOf(uuid);
+    const ObjectStorage t = theirs.currentOf(uuid);
     if (!o) {
       if (!t || t == b) {
         result.deleted(b);
@@ -62,7 +63,7 @@ void compareBaseElements(const Delta::Impl& base, const StorageMap& ours, const 
     } else if (o == b) {
       if (!t) {
         result.deleted(b);
-      } else if (const ObjectStorage p = presentEntry(base.getPrevious(), uuid)) {
+      } else if (const ObjectStorage p = base.previousOf(uuid)) {
         // Ours left it alone: theirs is taken unseen, against the base's previous entry.
         result.updated(p, t);
       } else {
@@ -73,25 +74,25 @@ void compareBaseElements(const Delta::Impl& base, const StorageMap& ours, const 
     } else {
       result.conflict(b, o, t);
     }
-  });
+  }
 }
 
 // Step two: elements new on our side; step three: elements new on theirs only.
-void compareNewElements(const Delta::Impl& base, const StorageMap& ours, const StorageMap& theirs,
+void compareNewElements(const ComposedState& base, const ComposedState& ours, const ComposedState& theirs,
                         Diff3Result& result) {
-  history::forEachPresent(ours, [&](const Uuid& uuid, const ObjectStorage& o) {
-    if (presentEntry(base.getCurrent(), uuid)) return;
-    const ObjectStorage t = presentEntry(theirs, uuid);
+  for (const auto& [uuid, o] : ours.current) {
+    if (base.currentOf(uuid)) continue;
+    const ObjectStorage t = theirs.currentOf(uuid);
     if (!t || t == o) {
       result.created(o);
     } else {
       result.conflict({}, o, t);
     }
-  });
-  history::forEachPresent(theirs, [&](const Uuid& uuid, const ObjectStorage& t) {
-    if (presentEntry(base.getCurrent(), uuid) || presentEntry(base.getPrevious(), uuid)) return;
-    if (!presentEntry(ours, uuid)) result.created(t);
-  });
+  }
+  for (const auto& [uuid, t] : theirs.current) {
+    if (base.currentOf(uuid) || base.previousOf(uuid)) continue;
+    if (!ours.currentOf(uuid)) result.created(t);
+  }
 }
 
 }  // namespace
@@ -102,15 +103,11 @@ std::vector<Delta> Merge3Strategy::diff3(const Commit& base, const Commit& ours,
   history::requireLive(theirs, u"kiv.Merge3Strategy.diff3");
   qf::zero::Transaction transaction = history::beginTransactionOn(*ours.getImpl());
   Diff3Result result(ours.getModel());
-  Delta baseState = base->getSnapshot();
-  Delta oursState = ours->getSnapshot();
-  Delta theirsState = theirs->getSnapshot();
-  compareBaseElements(*baseState.getImpl(), oursState.getCurrent(), theirsState.getCurrent(), result);
-  compareNewElements(*baseState.getImpl(), oursState.getCurrent(), theirsState.getCurrent(), result);
-  // The snapshots share the recorded storages and own nothing.
-  baseState.destroy();
-  oursState.destroy();
-  theirsState.destroy();
+  const ComposedState baseState = history::snapshotState(base);
+  const ComposedState oursState = history::snapshotState(ours);
+  const ComposedState theirsState = history::snapshotState(theirs);
+  compareBaseElements(baseState, oursState, theirsState, result);
+  compareNewElements(baseState, oursState, theirsState, result);
   transaction.commit();
   return result.deltas();
 }

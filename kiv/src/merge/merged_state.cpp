@@ -12,7 +12,7 @@ using history::presentEntry;
 using qf::zero::JsonValue;
 using qf::zero::Uuid;
 
-MergedState::MergedState(Delta::Impl& merged, const history::StorageMap& base)
+MergedState::MergedState(Delta::Impl& merged, const history::StateEntries& base)
     : merged_(merged), base_(base) {}
 
 const JsonValue* MergedState::find(const Uuid& uuid) {
@@ -27,7 +27,7 @@ const JsonValue* MergedState::find(const Uuid& uuid) {
 const JsonValue* MergedState::findInBase(const Uuid& uuid) {
   if (const auto it = baseEntries_.find(uuid); it != baseEntries_.end())
     return it->second.is_null() ? nullptr : &it->second;
-  const ObjectStorage storage = presentEntry(base_, uuid);
+  const ObjectStorage storage = baseEntry(uuid);
   JsonValue& entry = baseEntries_[uuid];
   if (storage) entry = storage.getContent();
   return entry.is_null() ? nullptr : &entry;
@@ -42,6 +42,11 @@ JsonValue MergedState::deletedEntry(const Uuid& uuid) const {
   return storage ? storage.getContent() : JsonValue();
 }
 
+ObjectStorage MergedState::baseEntry(const Uuid& uuid) const {
+  const auto it = base_.find(uuid);
+  return it != base_.end() ? it->second : ObjectStorage();
+}
+
 void MergedState::put(const Uuid& uuid, JsonValue entry, std::vector<ObjectStorage> sameAs) {
   entries_[uuid] = std::move(entry);
   Rewrite& rewrite = rewritten_[uuid];
@@ -51,7 +56,7 @@ void MergedState::put(const Uuid& uuid, JsonValue entry, std::vector<ObjectStora
 std::vector<Uuid> MergedState::changed() const {
   std::vector<Uuid> changed;
   history::forEachPresent(merged_.getCurrent(), [&](const Uuid& uuid, const ObjectStorage& storage) {
-    if (presentEntry(base_, uuid) != storage || rewritten_.count(uuid) != 0) changed.push_back(uuid);
+    if (baseEntry(uuid) != storage || rewritten_.count(uuid) != 0) changed.push_back(uuid);
   });
   for (const auto& rewrite : rewritten_) {
     if (!presentEntry(merged_.getCurrent(), rewrite.first)) changed.push_back(rewrite.first);
@@ -80,7 +85,7 @@ void MergedState::write() {
       if (it->second == storage) continue;
       current.remove(ObjectStorage(it->second));
     } else if (!presentEntry(previous, uuid)) {
-      if (const ObjectStorage before = presentEntry(base_, uuid)) previous.add(before);
+      if (const ObjectStorage before = baseEntry(uuid)) previous.add(before);
     }
     current.add(storage);
   }

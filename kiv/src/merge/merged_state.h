@@ -3,6 +3,7 @@
 // first read; rewritten ones become storages when the merge is written back.
 #pragma once
 
+#include "history/composed_state.h"
 #include "history/history_support.h"
 #include "kiv/metamodel/delta_impl.h"
 #include "qf/zero/core/meta/framework_package.h"
@@ -18,8 +19,8 @@ namespace kiv::merge {
 
 class MergedState {
  public:
-  // `base`: the current map of the base's snapshot.
-  MergedState(Delta::Impl& merged, const history::StorageMap& base);
+  // `base`: the current entries of the base's snapshot.
+  MergedState(Delta::Impl& merged, const history::StateEntries& base);
 
   // The element's merged entry; null when the merged state does not hold the element.
   const qf::zero::JsonValue* find(const qf::zero::Uuid& uuid);
@@ -47,8 +48,10 @@ class MergedState {
   };
   using Hash = boost::hash<qf::zero::Uuid>;
 
+  ObjectStorage baseEntry(const qf::zero::Uuid& uuid) const;
+
   Delta::Impl& merged_;
-  const history::StorageMap& base_;
+  const history::StateEntries& base_;
   std::unordered_map<qf::zero::Uuid, qf::zero::JsonValue, Hash> entries_;
   std::unordered_map<qf::zero::Uuid, qf::zero::JsonValue, Hash> baseEntries_;
   std::unordered_map<qf::zero::Uuid, Rewrite, Hash> rewritten_;

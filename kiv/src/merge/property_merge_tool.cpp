@@ -1,5 +1,6 @@
 #include "kiv/merge/property_merge_tool.h"
 
+#include "history/composed_state.h"
 #include "history/history_support.h"
 #include "kiv/metamodel/commit_impl.h"
 #include "kiv/metamodel/delta_impl.h"
@@ -139,7 +140,7 @@ Delta PropertyMergeTool::run(const Commit& ancestor, const Commit&, const Commit
   const Delta::Impl& ours = *deltas[1].getImpl();
   const Delta::Impl& theirs = *deltas[2].getImpl();
   qf::zero::Transaction transaction = history::beginTransactionOn(merged);
-  Delta baseState = ancestor->getSnapshot();
+  const history::ComposedState baseState = history::snapshotState(ancestor);
 
   std::set<Uuid> open;
   const auto collect = [&](const Uuid& uuid, const ObjectStorage&) { open.insert(uuid); };
@@ -150,7 +151,7 @@ Delta PropertyMergeTool::run(const Commit& ancestor, const Commit&, const Commit
 
   std::vector<MergeConflict> found;
   EntrySchemas schemas;
-  merge::MergedState state(merged, baseState.getCurrent());
+  merge::MergedState state(merged, baseState.current);
   ElementSettler settler(policy_ == ConflictPolicy::PreferTheirs, schemas, found);
   for (const Uuid& uuid : open) {
     ObjectStorage base = presentEntry(ours.getPrevious(), uuid);
@@ -173,7 +174,6 @@ Delta PropertyMergeTool::run(const Commit& ancestor, const Commit&, const Commit
   merge::RepairLog log(found);
   merge::repairMergedState(state, schemas, log);
   state.write();
-  baseState.destroy();
   transaction.commit();
   conflicts_.insert(conflicts_.end(), found.begin(), found.end());
   return deltas[0];

@@ -1,0 +1,220 @@
+// Merging two branches of a long history, in one run:
+//
+//   A user model of N cards (about 270 bytes of JSON each; N = 10,000 and 100,000) whose
+//   initial commit creates them all; a main line of 100 commits of 10 changed cards each;
+//   a side line forked at main commit 50 with 50 commits of its own, so that each side
+//   changed about 500 cards since the fork. The side changes another property of the
+//   cards it shares with main (one in ten), so the property tool merges them property by
+//   property while the accept-theirs tool takes the side's card whole.
+//
+//   - merge: the recursive three-way strategy merging the side into main, with each tool
+//     (0: accept theirs, 1: property by property);
+//   - snapshots: the three snapshots that the comparison and the property tool read
+//     (base, ours, theirs), composed and dropped: the part of a merge that grows with
+//     the model and the history rather than with what the sides changed.
+// Each merge runs in a transaction that is cancelled outside the timed region, so every
+// iteration merges the same history.
+#include "kiv/merge/accept_theirs_merge_tool.h"
+#include "kiv/merge/property_merge_tool.h"
+#include "kiv/merge/recursive_merge3_strategy.h"
+#include "kiv/metamodel/commit_impl.h"
+#include "kiv/metamodel/delta_impl.h"
+#include "qf/zero/core/meta/meta_registry.h"
+#include "qf/zero/core/model_impl.h"
+#include "qf/zero/io/json_parser.h"
+#include "qf/zero/io/json_serializer.h"
+
+#include <benchmark/benchmark.h>
+
+#include <nlohmann/json.hpp>
+
+#include <map>
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace {
+
+using qf::zero::Model;
+using qf::zero::ModelElement;
+using qf::zero::Transaction;
+using qf::zero::Value;
+namespace meta = qf::zero::meta;
+
+// Package "/bench/merge": class Card {name, title, note: String; count, weight: Integer}.
+struct MergeCards {
+  Model metaModel = Model::create();
+  meta::Package package = meta::Package::create(metaModel, {}, u"/bench/merge", u"bm");
+  meta::Class card = meta::Class::create(metaModel, {}, u"Card", u"bm.Card", false);
+  meta::Property name, title, note, count, weight;
+
+  MergeCards() {
+    auto& registry = meta::MetaRegistry::getInstance();
+    card->setSuperclass(ModelElement::metaClass());
+    int index = 0;
+    const auto add = [&](const char16_t* propertyName, const char16_t* type) {
+      meta::Property p = meta::Property::create(metaModel, {}, propertyName, meta::ValueFlags::Single, false);
+      p->setType(registry.getPrimitiveType(type));
+      p->setPropertyIndex(++index);
+      card->addProperty(p);
+      return p;
+    };
+    name = add(u"name", u"String");
+    title = add(u"title", u"String");
+    note = add(u"note", u"String");
+    count = add(u"count", u"Integer");
+    weight = add(u"weight", u"Integer");
+    package->addType(card);
+    registry.registerRootPackage(package);
+  }
+  ~MergeCards() { meta::MetaRegistry::getInstance().unregisterRootPackage(u"/bench/merge"); }
+  MergeCards(const MergeCards&) = delete;
+  MergeCards& operator=(const MergeCards&) = delete;
+};
+
+const MergeCards& mergeCards() {
+  static const MergeCards instance;
+  return instance;
+}
+
+std::u16string text(const std::u16string& prefix, std::size_t number) {
+  const std::string digits = std::to_string(number);
+  return prefix + std::u16string(digits.begin(), digits.end());
+}
+
+// One line of work: a user model of its own and the tip it records onto.
+struct Line {
+  Model user = Model::create();
+  std::vector<ModelElement> cards;
+  kiv::Commit tip;
+
+  // Sets `property` of the cards first, first + stride, ... (count of them) and records
+  // them as one commit on the tip.
+  void record(const Model& repository, const meta::Property& property, std::size_t first, std::size_t stride,
+              std::size_t count, int value) {
+    std::vector<ModelElement> changed;
+    {
+      Transaction edit = user->beginTransaction();
+      for (std::size_t i = 0; i < count; ++i) {
+        ModelElement& card = cards[(first + i * stride) % cards.size()];
+        card.setPropertyValue(property, Value::of(value));
+        changed.push_back(card);
+      }
+      edit.commit();
+    }
+    Transaction transaction = repository->beginTransaction();
+    const kiv::Commit commit = kiv::Commit::create(repository);
+    commit->addParent(tip);
+    for (const ModelElement& card : changed) commit->addUpdated(card);
+    transaction.commit();
+    tip = commit;
+  }
+
+  // A line that starts where this one stands, in a copy of its user model.
+  Line fork() const {
+    nlohmann::ordered_json document;
+    qf::zero::io::JSONSerializer().serialize(
+        user, qf::zero::io::SerializationOutput::forIntermediateFormat(&document));
+    Line copy;
+    qf::zero::io::JSONParser().parseVerbatim(document, copy.user);
+    for (const ModelElement& card : cards) copy.cards.push_back(copy.user->findElement(card.getUuid()));
+    copy.tip = tip;
+    return copy;
+  }
+};
+
+class DivergedHistory {
+ public:
+  explicit DivergedHistory(std::size_t n) {
+    const MergeCards& m = mergeCards();
+    {
+      Transaction build = main_.user->beginTransaction();
+      for (std::size_t i = 0; i < n; ++i) {
+        ModelElement card = m.card.instantiate(main_.user);
+        card.setPropertyValue(m.name, Value::of(text(u"card ", i)));
+        card.setPropertyValue(m.title, Value::of(text(u"The title of the card numbered ", i)));
+        card.setPropertyValue(m.note, Value::of(text(u"A note long enough to make the entry about as large "
+                                                     u"as a typical element of a model: ",
+                                                     i)));
+        card.setPropertyValue(m.count, Value::of(static_cast<int>(i)));
+        main_.cards.push_back(card);
+      }
+      build.commit();
+    }
+    {
+      Transaction transaction = repository_->beginTransaction();
+      main_.tip = kiv::Commit::create(repository_);
+      for (const ModelElement& card : main_.cards) main_.tip->addCreated(card);
+      transaction.commit();
+    }
+    // Main changes the weight of cards 0, 1, 2, ...; the side changes the count of every
+    // tenth card from the fork's next card on, so one in ten of its cards is also main's.
+    Line side;
+    for (std::size_t commit = 1; commit < 100; ++commit) {
+      if (commit == 50) side = main_.fork();
+      main_.record(repository_, m.weight, commit * 10, 1, 10, static_cast<int>(commit));
+    }
+    for (std::size_t commit = 0; commit < 50; ++commit) {
+      side.record(repository_, m.count, 500 + commit * 10 * 9, 9, 10, -static_cast<int>(commit));
+    }
+    theirs_ = side.tip;
+  }
+
+  const Model& repository() const { return repository_; }
+  const kiv::Commit& ours() const { return main_.tip; }
+  const kiv::Commit& theirs() const { return theirs_; }
+
+ private:
+  Model repository_ = Model::create();
+  Line main_;
+  kiv::Commit theirs_;
+};
+
+DivergedHistory& divergedHistory(std::size_t n) {
+  static std::map<std::size_t, std::unique_ptr<DivergedHistory>> histories;
+  std::unique_ptr<DivergedHistory>& history = histories[n];
+  if (!history) history = std::make_unique<DivergedHistory>(n);
+  return *history;
+}
+
+// Arguments: N, tool (0: accept theirs, 1: property by property).
+void merge(benchmark::State& state) {
+  const DivergedHistory& history = divergedHistory(static_cast<std::size_t>(state.range(0)));
+  std::unique_ptr<kiv::IMergeTool> tool;
+  if (state.range(1) == 0) {
+    tool = std::make_unique<kiv::AcceptTheirsMergeTool>();
+  } else {
+    tool = std::make_unique<kiv::PropertyMergeTool>();
+  }
+  const kiv::RecursiveMerge3Strategy strategy(std::move(tool));
+  std::size_t mergedEntries = 0;
+  for (auto _ : state) {
+    Transaction cancelled = history.repository()->beginTransaction();
+    const kiv::Commit merged = strategy.run(history.ours(), history.theirs());
+    state.PauseTiming();
+    mergedEntries = merged->getDelta().getCurrent().size();
+    cancelled.cancel();
+    state.ResumeTiming();
+  }
+  state.counters["merged_entries"] = static_cast<double>(mergedEntries);
+}
+
+// Argument: N. The snapshots of the fork point, ours and theirs.
+void snapshots(benchmark::State& state) {
+  const DivergedHistory& history = divergedHistory(static_cast<std::size_t>(state.range(0)));
+  kiv::Commit base = history.theirs();
+  for (int i = 0; i < 50; ++i) base = base->getParent();
+  for (auto _ : state) {
+    Transaction cancelled = history.repository()->beginTransaction();
+    for (const kiv::Commit& commit : {base, history.ours(), history.theirs()})
+      benchmark::DoNotOptimize(commit->getSnapshot());
+    state.PauseTiming();
+    cancelled.cancel();
+    state.ResumeTiming();
+  }
+}
+
+BENCHMARK(merge)->ArgsProduct({{10000, 100000}, {0, 1}})->Unit(benchmark::kMillisecond)->MinTime(2.0);
+BENCHMARK(snapshots)->Arg(10000)->Arg(100000)->Unit(benchmark::kMillisecond)->MinTime(2.0);
+
+}  // namespace
