@@ -11,6 +11,7 @@
 //     of 1,000 commits of 10 updates each.
 //
 // User elements are cards of about 260 bytes of JSON each.
+#include "card_metamodel.h"
 #include "kiv/history/element_reuse_model_builder.h"
 #include "kiv/metamodel/commit_impl.h"
 #include "kiv/metamodel/delta_impl.h"
@@ -39,66 +40,20 @@ using qf::zero::Model;
 using qf::zero::ModelElement;
 using qf::zero::Transaction;
 using qf::zero::Value;
-namespace meta = qf::zero::meta;
 
-// Package "/bench/commit": class Card {name, title, note: String; count, weight: Integer}.
-struct CardMetamodel {
-  Model metaModel = Model::create();
-  meta::Package package = meta::Package::create(metaModel, {}, u"/bench/commit", u"bc");
-  meta::Class card = meta::Class::create(metaModel, {}, u"Card", u"bc.Card", false);
-  meta::Property name, title, note, count, weight;
-
-  CardMetamodel() {
-    auto& registry = meta::MetaRegistry::getInstance();
-    card->setSuperclass(ModelElement::metaClass());
-    int index = 0;
-    auto add = [&](const char16_t* propertyName, const char16_t* type) {
-      meta::Property p = meta::Property::create(metaModel, {}, propertyName, meta::ValueFlags::Single, false);
-      p->setType(registry.getPrimitiveType(type));
-      p->setPropertyIndex(++index);
-      card->addProperty(p);
-      return p;
-    };
-    name = add(u"name", u"String");
-    title = add(u"title", u"String");
-    note = add(u"note", u"String");
-    count = add(u"count", u"Integer");
-    weight = add(u"weight", u"Integer");
-    package->addType(card);
-    registry.registerRootPackage(package);
-  }
-  ~CardMetamodel() { meta::MetaRegistry::getInstance().unregisterRootPackage(u"/bench/commit"); }
-  CardMetamodel(const CardMetamodel&) = delete;
-  CardMetamodel& operator=(const CardMetamodel&) = delete;
-};
-
-const CardMetamodel& cards() {
-  static const CardMetamodel instance;
+const bench::CardMetamodel& cards() {
+  static const bench::CardMetamodel instance(u"/bench/commit", u"bc");
   return instance;
-}
-
-std::u16string numbered(const char16_t* prefix, std::size_t number) {
-  const std::string digits = std::to_string(number);
-  return prefix + std::u16string(digits.begin(), digits.end());
 }
 
 // A user model of n cards and a repository whose initial commit creates them all.
 class CardHistory {
  public:
   explicit CardHistory(std::size_t n) {
-    const CardMetamodel& m = cards();
+    const bench::CardMetamodel& m = cards();
     {
       Transaction build = user_->beginTransaction();
-      for (std::size_t i = 0; i < n; ++i) {
-        ModelElement card = m.card.instantiate(user_);
-        card.setPropertyValue(m.name, Value::of(numbered(u"card ", i)));
-        card.setPropertyValue(m.title, Value::of(numbered(u"The title of the card numbered ", i)));
-        card.setPropertyValue(m.note, Value::of(numbered(u"A note long enough to make the entry about as "
-                                                         u"large as a typical element: ",
-                                                         i)));
-        card.setPropertyValue(m.count, Value::of(static_cast<int>(i)));
-        cards_.push_back(card);
-      }
+      for (std::size_t i = 0; i < n; ++i) cards_.push_back(m.makeCard(user_, i));
       build.commit();
     }
     Transaction record = repository_->beginTransaction();
@@ -109,7 +64,7 @@ class CardHistory {
 
   // Changes the count of k cards, taken in turn, and records them as one commit on the tip.
   void recordUpdates(std::size_t k) {
-    const CardMetamodel& m = cards();
+    const bench::CardMetamodel& m = cards();
     std::vector<ModelElement> changed;
     {
       Transaction edit = user_->beginTransaction();

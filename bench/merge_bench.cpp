@@ -14,6 +14,7 @@
 //     the model and the history rather than with what the sides changed.
 // Each merge runs in a transaction that is cancelled outside the timed region, so every
 // iteration merges the same history.
+#include "card_metamodel.h"
 #include "kiv/merge/accept_theirs_merge_tool.h"
 #include "kiv/merge/property_merge_tool.h"
 #include "kiv/merge/recursive_merge3_strategy.h"
@@ -39,47 +40,10 @@ using qf::zero::Model;
 using qf::zero::ModelElement;
 using qf::zero::Transaction;
 using qf::zero::Value;
-namespace meta = qf::zero::meta;
 
-// Package "/bench/merge": class Card {name, title, note: String; count, weight: Integer}.
-struct MergeCards {
-  Model metaModel = Model::create();
-  meta::Package package = meta::Package::create(metaModel, {}, u"/bench/merge", u"bm");
-  meta::Class card = meta::Class::create(metaModel, {}, u"Card", u"bm.Card", false);
-  meta::Property name, title, note, count, weight;
-
-  MergeCards() {
-    auto& registry = meta::MetaRegistry::getInstance();
-    card->setSuperclass(ModelElement::metaClass());
-    int index = 0;
-    const auto add = [&](const char16_t* propertyName, const char16_t* type) {
-      meta::Property p = meta::Property::create(metaModel, {}, propertyName, meta::ValueFlags::Single, false);
-      p->setType(registry.getPrimitiveType(type));
-      p->setPropertyIndex(++index);
-      card->addProperty(p);
-      return p;
-    };
-    name = add(u"name", u"String");
-    title = add(u"title", u"String");
-    note = add(u"note", u"String");
-    count = add(u"count", u"Integer");
-    weight = add(u"weight", u"Integer");
-    package->addType(card);
-    registry.registerRootPackage(package);
-  }
-  ~MergeCards() { meta::MetaRegistry::getInstance().unregisterRootPackage(u"/bench/merge"); }
-  MergeCards(const MergeCards&) = delete;
-  MergeCards& operator=(const MergeCards&) = delete;
-};
-
-const MergeCards& mergeCards() {
-  static const MergeCards instance;
+const bench::CardMetamodel& mergeCards() {
+  static const bench::CardMetamodel instance(u"/bench/merge", u"bm");
   return instance;
-}
-
-std::u16string text(const std::u16string& prefix, std::size_t number) {
-  const std::string digits = std::to_string(number);
-  return prefix + std::u16string(digits.begin(), digits.end());
 }
 
 // One line of work: a user model of its own and the tip it records onto.
@@ -90,8 +54,8 @@ struct Line {
 
   // Sets `property` of the cards first, first + stride, ... (count of them) and records
   // them as one commit on the tip.
-  void record(const Model& repository, const meta::Property& property, std::size_t first, std::size_t stride,
-              std::size_t count, int value) {
+  void record(const Model& repository, const qf::zero::meta::Property& property, std::size_t first,
+              std::size_t stride, std::size_t count, int value) {
     std::vector<ModelElement> changed;
     {
       Transaction edit = user->beginTransaction();
@@ -126,19 +90,10 @@ struct Line {
 class DivergedHistory {
  public:
   explicit DivergedHistory(std::size_t n) {
-    const MergeCards& m = mergeCards();
+    const bench::CardMetamodel& m = mergeCards();
     {
       Transaction build = main_.user->beginTransaction();
-      for (std::size_t i = 0; i < n; ++i) {
-        ModelElement card = m.card.instantiate(main_.user);
-        card.setPropertyValue(m.name, Value::of(text(u"card ", i)));
-        card.setPropertyValue(m.title, Value::of(text(u"The title of the card numbered ", i)));
-        card.setPropertyValue(m.note, Value::of(text(u"A note long enough to make the entry about as large "
-                                                     u"as a typical element of a model: ",
-                                                     i)));
-        card.setPropertyValue(m.count, Value::of(static_cast<int>(i)));
-        main_.cards.push_back(card);
-      }
+      for (std::size_t i = 0; i < n; ++i) main_.cards.push_back(m.makeCard(main_.user, i));
       build.commit();
     }
     {
