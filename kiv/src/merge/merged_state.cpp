@@ -53,15 +53,18 @@ void MergedState::put(const Uuid& uuid, JsonValue entry, std::vector<ObjectStora
   rewrite.sameAs.insert(rewrite.sameAs.end(), sameAs.begin(), sameAs.end());
 }
 
+// What the comparison changed is read once: it stays as it is while the merge rewrites.
 std::vector<Uuid> MergedState::changed() const {
-  std::vector<Uuid> changed;
-  history::forEachPresent(merged_.getCurrent(), [&](const Uuid& uuid, const ObjectStorage& storage) {
-    if (baseEntry(uuid) != storage || rewritten_.count(uuid) != 0) changed.push_back(uuid);
-  });
-  for (const auto& rewrite : rewritten_) {
-    if (!presentEntry(merged_.getCurrent(), rewrite.first)) changed.push_back(rewrite.first);
+  if (!comparedChanges_) {
+    comparedChanges_.emplace();
+    history::forEachPresent(merged_.getCurrent(), [&](const Uuid& uuid, const ObjectStorage& storage) {
+      if (baseEntry(uuid) != storage) comparedChanges_->push_back(uuid);
+    });
   }
+  std::vector<Uuid> changed = *comparedChanges_;
+  for (const auto& rewrite : rewritten_) changed.push_back(rewrite.first);
   std::sort(changed.begin(), changed.end());
+  changed.erase(std::unique(changed.begin(), changed.end()), changed.end());
   return changed;
 }
 

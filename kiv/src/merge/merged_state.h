@@ -12,6 +12,7 @@
 
 #include <nlohmann/json.hpp>
 
+#include <optional>
 #include <unordered_map>
 #include <vector>
 
@@ -55,6 +56,7 @@ class MergedState {
   std::unordered_map<qf::zero::Uuid, qf::zero::JsonValue, Hash> entries_;
   std::unordered_map<qf::zero::Uuid, qf::zero::JsonValue, Hash> baseEntries_;
   std::unordered_map<qf::zero::Uuid, Rewrite, Hash> rewritten_;
+  mutable std::optional<std::vector<qf::zero::Uuid>> comparedChanges_;
 };
 
 }  // namespace kiv::merge
