@@ -1,5 +1,5 @@
-// Merges of seeded random divergences: a base state of the test metamodel, then one
-// commit of random edits on each side. Every property runs on 300 seeds; a failure
+// Merges of seeded random divergences: a base state of the test metamodel, then one to
+// three commits of random edits on each side. Every property runs on 300 seeds; a failure
 // names its seed.
 #include "../history/history_fixture.h"
 #include "kiv/merge/accept_theirs_merge_strategy.h"
@@ -40,13 +40,17 @@ class MergeProperties : public ::testing::Test, public HistoryModels {
     const auto side = [&](unsigned sideSeed, Entries& state, JsonValue* document) {
       const Model model = modelFromDocument(baseDocument);
       support::RandomEditor sideEditor(tm, model, sideSeed);
-      kiv::Commit tip = record(repository, model, {d.base}, [&] {
-        for (int i = 0; i < sideEdits; ++i) sideEditor.step();
-      });
+      kiv::Commit tip = d.base;
+      for (unsigned commit = 0; commit < 1 + sideSeed % 3; ++commit) {
+        const kiv::Commit next = record(repository, model, {tip}, [&] {
+          for (int i = 0; i < sideEdits; ++i) sideEditor.step();
+        });
+        if (next) tip = next;
+      }
       const JsonValue sideDocument = support::serializeModel(model);
       state = support::entriesById(sideDocument);
       if (document != nullptr) *document = sideDocument;
-      return tip ? tip : d.base;
+      return tip;
     };
     d.ours = side(seed * 7 + 1, d.ourState, &d.ourDocument);
     d.theirs = side(seed * 7 + 2, d.theirState, nullptr);
