@@ -39,14 +39,22 @@ class Lifecycles {
     for (std::size_t position = 0; position < deltas.size(); ++position) {
       if (!history::isLive(deltas[position])) continue;
       const Delta::Impl& delta = *deltas[position].getImpl();
+      const auto noteCreation = [&](const Uuid& uuid) {
+        if (presentEntry(delta.getCurrent(), uuid) && !presentEntry(delta.getPrevious(), uuid))
+          oldestCreation_[uuid] = position;
+      };
+      // A delta larger than the set is asked about each element of the set instead.
+      if (delta.getCurrent().size() > withPrevious.size()) {
+        for (const Uuid& uuid : withPrevious) noteCreation(uuid);
+        continue;
+      }
       for (const auto& [key, held] : delta.getCurrent().container()) {
         // A live entry is filed under its element's UUID, a proxy under the nil UUID.
         if (!key.is_nil() && withPrevious.count(key) == 0) continue;
         const ObjectStorage storage = held.isLive() ? held : history::residentOf(delta.getCurrent(), held);
         if (!storage) continue;
         const Uuid uuid = held.isLive() ? key : storage.getElementUUID().value_or(key);
-        if (withPrevious.count(uuid) != 0 && !presentEntry(delta.getPrevious(), uuid))
-          oldestCreation_[uuid] = position;
+        if (withPrevious.count(uuid) != 0) noteCreation(uuid);
       }
     }
   }
