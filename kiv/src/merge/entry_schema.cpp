@@ -38,6 +38,7 @@ EntrySchema schemaOf(const std::string& type) {
       entry.oppositeShape = shapeOf(opposite);
       entry.containerEnd = entry.shape == Shape::Single && opposite->isContainment();
     }
+    schema.hasReferences = schema.hasReferences || entry.reference;
     schema.properties.push_back(std::move(entry));
   }
   return schema;

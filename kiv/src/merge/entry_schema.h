@@ -29,6 +29,7 @@ struct PropertySchema {
 
 struct EntrySchema {
   std::vector<PropertySchema> properties;
+  bool hasReferences = false;
   const PropertySchema* find(std::string_view name) const;
 };
 

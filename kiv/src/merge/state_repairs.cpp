@@ -74,8 +74,8 @@ class Repairs {
       work_.pop_front();
       if (++visits_[uuid] > kVisitsPerElement) continue;
       const JsonValue* found = state_.find(uuid);
-      if (found == nullptr) continue;
-      const JsonValue entry = *found;
+      if (found == nullptr || !schemas_.of(*found).hasReferences) continue;
+      const JsonValue entry = *found;  // the repairs below may rewrite it
       for (const PropertySchema& property : schemas_.of(entry).properties) {
         if (!property.reference) continue;
         for (const Uuid& target : referencedBy(memberOf(entry, property.name))) {
