@@ -1,11 +1,11 @@
 // Merging two branches of a long history, in one run:
 //
-//   A user model of N cards (about 270 bytes of JSON each; N = 10,000 and 100,000) whose
+//   A user model of N cards (about 250 bytes of JSON each; N = 10,000 and 100,000) whose
 //   initial commit creates them all; a main line of 100 commits of 10 changed cards each;
 //   a side line forked at main commit 50 with 50 commits of its own, so that each side
 //   changed about 500 cards since the fork. The side changes another property of the
-//   cards it shares with main (one in ten), so the property tool merges them property by
-//   property while the accept-theirs tool takes the side's card whole.
+//   cards it shares with main (about one in nine), so the property tool merges them
+//   property by property while the accept-theirs tool takes the side's card whole.
 //
 //   - merge: the recursive three-way strategy merging the side into main, with each tool
 //     (0: accept theirs, 1: property by property);
@@ -103,8 +103,9 @@ class DivergedHistory {
       for (const ModelElement& card : main_.cards) main_.tip->addCreated(card);
       transaction.commit();
     }
-    // Main changes the weight of cards 0, 1, 2, ...; the side changes the count of every
-    // tenth card from the fork's next card on, so one in ten of its cards is also main's.
+    // Main changes the weight of cards 10, 11, 12, ... up to 999; the side changes the
+    // count of every ninth card from card 500 on, so the 56 of its cards below 1,000 are
+    // also main's.
     Line side;
     for (std::size_t commit = 1; commit < 100; ++commit) {
       if (commit == 50) side = main_.fork();
