@@ -78,7 +78,10 @@ void MergedState::write() {
     const JsonValue& entry = entries_.at(uuid);
     ObjectStorage storage;
     for (const ObjectStorage& candidate : rewritten_.at(uuid).sameAs) {
-      if (history::isLive(candidate) && candidate.getContent() == entry) storage = candidate;
+      if (history::isLive(candidate) && candidate.getContent() == entry) {
+        storage = candidate;
+        break;
+      }
     }
     if (!storage) {
       storage =

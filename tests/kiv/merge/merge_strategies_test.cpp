@@ -92,13 +92,15 @@ TEST_F(MergeGraph, TwoEqualCandidatesFoldToOneButThreeDoNot) {
   const Commit c = commitOn({root});
   const Commit x = commitOn({c}), y = commitOn({c}), z = commitOn({c});
   EXPECT_EQ(Merge3Strategy::findLCA(c, commitOn({x, y})), std::vector<Commit>{c});
+  // Three paths of differing lengths, each sharing [root, c] with the path of c.
   const Commit threeWays = commitOn({commitOn({x, y}), z});
-  const Commit fourWays = commitOn({commitOn({x, y}), commitOn({y, z})});
-  EXPECT_EQ(Merge3Strategy::findLCA(c, fourWays), (std::vector<Commit>{c, c, c, c}));
-  const Commit ours = commitOn({c});
+  EXPECT_EQ(Merge3Strategy::findLCA(c, threeWays), (std::vector<Commit>{c, c, c}));
   Merge3Strategy plain(std::make_unique<kiv::AcceptTheirsMergeTool>());
-  EXPECT_THROW(plain.run(ours, fourWays), Exception<kiv::messages::NoUniqueLCA>);
-  (void)threeWays;
+  EXPECT_THROW(plain.run(commitOn({c}), threeWays), Exception<kiv::messages::NoUniqueLCA>);
+  // Four equally long paths: the commit is its own ancestor four times over.
+  const Commit fourWays = commitOn({commitOn({x, y}), commitOn({y, z})});
+  EXPECT_EQ(Merge3Strategy::findLCA(fourWays, fourWays),
+            (std::vector<Commit>{fourWays, fourWays, fourWays, fourWays}));
   // The recursive strategy takes the commit itself as the base instead of merging it
   // with itself, which would ask the same question again without end.
   const Commit merged =
