@@ -1,95 +1,258 @@
+#include "kiv/merge/merge_strategy.h"
+#include "kiv/messages/messages.h"
+#include "kiv/metamodel/branch_impl.h"
+#include "kiv/metamodel/commit_impl.h"
+#include "kiv/metamodel/delta_impl.h"
+#include "kiv/metamodel/local_repository_impl.h"
 #include "kiv/metamodel/workspace_impl.h"
+#include "kiv/workspace/commit_producer.h"
 #include "qf/zero/core/messages.h"
+#include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/report_exception.h"
+#include "qf/zero/core/transaction.h"
+
+#include <functional>
 
 namespace kiv {
 
-bool Workspace::Impl::canRedo() const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.canRedo"));
+namespace {
+
+bool isPresent(const qf::zero::ModelElement& element) { return element && element.isLive(); }
+
+// The live head branch of the workspace's repository; raises "CannotCommit" when the
+// workspace belongs to no repository or the repository has no head.
+Branch headOf(const Workspace::Impl& workspace) {
+  const LocalRepository repository = workspace.getRepository();
+  const Branch head = isPresent(repository) ? repository->getHead() : Branch();
+  if (!isPresent(head)) qf::zero::reportException(messages::CannotCommit());
+  return head;
 }
 
-bool Workspace::Impl::canUndo() const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.canUndo"));
+Commit liveTipOf(const Branch& head) {
+  const Commit tip = head->getTip();
+  return isPresent(tip) ? tip : Commit();
 }
+
+// One transaction of the repository model: a savepoint of the caller's when one is open.
+qf::zero::Transaction beginOn(const Workspace::Impl& workspace) {
+  if (!workspace.isLive()) qf::zero::reportException(qf0::messages::CannotModifyDestroyedElement());
+  return workspace.getModelImpl()->beginTransaction();
+}
+
+// The producer that `init` made; raises "ElementRequired" before `init` or after destruction.
+CommitProducer& producerOf(const Workspace::Impl& workspace) {
+  const std::shared_ptr<CommitProducer>& producer = workspace.getCommitProducer();
+  if (!producer) qf::zero::reportException(qf0::messages::ElementRequired(u"kiv.Workspace.commitProducer"));
+  return *producer;
+}
+
+}  // namespace
+
+bool Workspace::Impl::canRedo() const { return headOf(*this)->canRedo(); }
+
+bool Workspace::Impl::canUndo() const { return headOf(*this)->canUndo(); }
 
 bool Workspace::Impl::canCommit() const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.canCommit"));
+  const LocalRepository repository = getRepository();
+  const Branch head = isPresent(repository) ? repository->getHead() : Branch();
+  return isPresent(head) && head->getTip() == ctx_;
 }
 
-bool Workspace::Impl::canCheckout(const std::u16string& /*name*/) const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.canCheckout"));
+bool Workspace::Impl::canCheckout(const std::u16string& name) const {
+  const LocalRepository repository = getRepository();
+  return isPresent(repository) && repository->canCheckout(name);
 }
 
-void Workspace::Impl::updateContext() {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.updateContext"));
-}
+void Workspace::Impl::updateContext() { setContext(liveTipOf(headOf(*this)), SetContextMode::ContextOnly); }
 
-std::future<void> Workspace::Impl::push(::kiv::PushMode /*mode*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.push"));
-}
+std::future<void> Workspace::Impl::push(PushMode mode) { return getRepository()->push(mode); }
 
+// The user model is rewritten on the worker once the repository's pull has ended.
 std::future<void> Workspace::Impl::pull() {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.pull"));
+  const Workspace self(this);
+  return std::async(std::launch::async, [self] {
+    std::future<void> pulled = self->getRepository()->pull();
+    pulled.get();
+    self->updateContext();
+  });
 }
 
 void Workspace::Impl::takeSnapshot() {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.takeSnapshot"));
+  const Branch head = headOf(*this);
+  const qf::zero::Model& user = producerOf(*this).getModel();
+  qf::zero::Transaction transaction = beginOn(*this);
+  const Commit snapshot = Commit::create(getModel());
+  if (const Commit tip = liveTipOf(head)) snapshot->addParent(tip);
+  for (const qf::zero::ModelElement& element : user->getInstances(
+           qf::zero::ModelElement::metaClass(), qf::zero::query::SearchClassMatchMode::IncludeSubclasses)) {
+    snapshot->addCreated(element);
+  }
+  if (!snapshot->getDelta()) snapshot->setDelta(Delta::create(getModel()));
+  snapshot->getDelta()->setIsSnapshot(true);
+  setCtx(snapshot);
+  head->commit(snapshot);
+  transaction.commit();
 }
 
+// The user model is rewritten last, after every change of the repository model, so that a
+// failure anywhere leaves both models as they were.
 void Workspace::Impl::undo() {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.undo"));
+  const Branch head = headOf(*this);
+  qf::zero::Transaction transaction = beginOn(*this);
+  Delta back = head->undo();
+  setCtx(liveTipOf(head));
+  producerOf(*this).update(back);
+  back.destroy();
+  transaction.commit();
 }
 
+// The redone commit's delta belongs to its commit: it is applied, never destroyed.
 void Workspace::Impl::redo() {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.redo"));
+  const Branch head = headOf(*this);
+  qf::zero::Transaction transaction = beginOn(*this);
+  const Delta forward = head->redo();
+  setCtx(liveTipOf(head));
+  if (isPresent(forward)) producerOf(*this).update(forward);
+  transaction.commit();
 }
 
-void Workspace::Impl::setContext(const ::kiv::Commit& /*commit*/, ::kiv::SetContextMode /*mode*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.setContext"));
+void Workspace::Impl::setContext(const Commit& commit, SetContextMode mode) {
+  if (commit == ctx_) return;
+  CommitProducer& rewriter = producerOf(*this);
+  qf::zero::Transaction transaction = beginOn(*this);
+  const Commit from = ctx_;
+  setCtx(commit);
+  if (mode == SetContextMode::BranchUpdate) {
+    const Branch head = headOf(*this);
+    head->setTip(commit);
+    head->getRedoStackMutable().clear();
+  }
+  if (!isPresent(commit)) {
+    rewriter.clearModel();
+  } else if (!isPresent(from)) {
+    // The whole state of the new context: for an initial commit or a snapshot this is its
+    // own delta, and for any other commit it is what the user model must become.
+    Delta state = commit->getSnapshot();
+    rewriter.update(state);
+    state.destroy();
+  } else if (from->isPredecessorOf(commit)) {
+    Delta forward = commit->diff(from);
+    rewriter.update(forward);
+    forward.destroy();
+  } else {
+    Delta difference = from->diff(commit);
+    Delta backward = difference->invert();
+    difference.destroy();
+    rewriter.update(backward);
+    backward.destroy();
+  }
+  transaction.commit();
 }
 
-void Workspace::Impl::branch(const std::u16string& /*name*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.branch"));
+void Workspace::Impl::branch(const std::u16string& name) {
+  const LocalRepository repository = getRepository();
+  if (!isPresent(repository))
+    qf::zero::reportException(qf0::messages::ElementRequired(u"kiv.Workspace.repository"));
+  if (repository->canCheckout(name)) qf::zero::reportException(messages::BranchExists(name));
+  qf::zero::Transaction transaction = beginOn(*this);
+  const Branch created = Branch::create(getModel());
+  created->setName(name);
+  if (isPresent(ctx_)) created->commit(ctx_);
+  repository->add(created);
+  repository->checkout(name);
+  transaction.commit();
 }
 
-void Workspace::Impl::checkout(const std::u16string& /*branch*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.checkout"));
+void Workspace::Impl::checkout(const std::u16string& name) {
+  const LocalRepository repository = getRepository();
+  if (!isPresent(repository) || !repository->canCheckout(name)) {
+    qf::zero::reportException(messages::CannotCheckout(name));
+  }
+  qf::zero::Transaction transaction = beginOn(*this);
+  repository->checkout(name);
+  setContext(liveTipOf(repository->getHead()), SetContextMode::ContextOnly);
+  transaction.commit();
 }
 
-void Workspace::Impl::merge(const std::u16string& /*srcBranch*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.merge"));
+void Workspace::Impl::merge(const std::u16string& name) {
+  const LocalRepository repository = getRepository();
+  if (!isPresent(repository) || !repository->canCheckout(name)) {
+    qf::zero::reportException(messages::CannotCheckout(name));
+  }
+  const std::shared_ptr<IMergeStrategy>& strategy = repository->getIMergeStrategy();
+  if (!strategy)
+    qf::zero::reportException(qf0::messages::ElementRequired(u"kiv.LocalRepository.IMergeStrategy"));
+  const Branch head = headOf(*this);
+  const auto& branches = repository->getBranches().container();
+  const auto other = branches.find(name);
+  qf::zero::Transaction transaction = beginOn(*this);
+  head->merge(other == branches.end() ? Branch() : other->second, *strategy);
+  setContext(liveTipOf(head), SetContextMode::ContextOnly);
+  transaction.commit();
 }
 
-void Workspace::Impl::commit(const ::kiv::Commit& /*commit*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.commit"));
+void Workspace::Impl::commit(const Commit& commit) {
+  if (!canCommit()) qf::zero::reportException(messages::CannotCommit());
+  const Branch head = headOf(*this);
+  qf::zero::Transaction transaction = beginOn(*this);
+  head->commit(commit);
+  setCtx(commit);
+  transaction.commit();
 }
 
-::kiv::Commit Workspace::Impl::getContext() const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.getContext"));
+Commit Workspace::Impl::getContext() const { return ctx_; }
+
+void Workspace::Impl::init(const qf::zero::Model& userModel) {
+  if (!userModel) qf::zero::reportException(qf0::messages::ElementRequired(u"kiv.Workspace.init"));
+  qf::zero::Transaction transaction = beginOn(*this);
+  if (!commitProducer_) {
+    auto created = std::make_shared<CommitProducer>(Workspace(this), userModel);
+    created->attach();
+    setCommitProducer(created);
+  }
+  const LocalRepository repository = getRepository();
+  const Branch head = isPresent(repository) ? repository->getHead() : Branch();
+  setCtx(isPresent(head) ? liveTipOf(head) : Commit());
+  transaction.commit();
 }
 
-void Workspace::Impl::init(const qf::zero::Model& /*baseModel*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.init"));
+void Workspace::Impl::update(const Delta& delta) {
+  if (!isPresent(delta)) qf::zero::reportException(qf0::messages::ElementRequired(u"kiv.Workspace.update"));
+  producerOf(*this).update(delta);
 }
 
-void Workspace::Impl::update(const ::kiv::Delta& /*delta*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.update"));
+void Workspace::Impl::commitTransaction(const std::function<void()>& edit) {
+  qf::zero::Transaction transaction = producerOf(*this).getModel()->beginTransaction(false);
+  edit();
+  transaction.commit();
 }
 
-void Workspace::Impl::commitTransaction(const std::function<void()>& /*fun*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.commitTransaction"));
+// The host callback runs on a copy that dies before the commit, whatever the callback does
+// with the original meanwhile.
+void Workspace::Impl::commitTransaction(const qf::zero::HxArray& callback) {
+  qf::zero::Transaction transaction = producerOf(*this).getModel()->beginTransaction(false);
+  {
+    const qf::zero::HxArray copy = callback;
+    copy({});
+  }
+  transaction.commit();
 }
 
-void Workspace::Impl::commitTransaction(const qf::zero::HxArray& /*fun*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.commitTransaction"));
-}
-
-void Workspace::Impl::synchronousPush(::kiv::PushMode /*mode*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.synchronousPush"));
+void Workspace::Impl::synchronousPush(PushMode mode) {
+  std::future<void> pending = push(mode);
+  pending.wait();
 }
 
 void Workspace::Impl::synchronousPull() {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Workspace.synchronousPull"));
+  std::future<void> pending = pull();
+  pending.wait();
+}
+
+void Workspace::Impl::aboutToDestroy() { setCommitProducer(nullptr); }
+
+void Workspace::Impl::invalidate() {
+  basicSetCommitProducer(nullptr);
+  qf::zero::ModelElement::Impl::invalidate();
 }
 
 }  // namespace kiv

@@ -26,6 +26,8 @@ TEST(KivMessages, EveryKeyHasATextAndAClassWhoseArgumentsFillItsPlaceholders) {
       messageRow<msg::CannotRedo>(),
       messageRow<msg::CannotUndo>(),
       messageRow<msg::HeadDelete>(),
+      messageRow<msg::ModelsIdentical>(),
+      messageRow<msg::ModelsSwapped>(),
       messageRow<msg::NoOrigin>(),
       messageRow<msg::NoSuchElement>("0b2c5a9e-3f1d-4c2b-9a8e-7d6c5b4a3f21"),
       messageRow<msg::NoSuchElementCur>("9f8e7d6c-5b4a-4321-8fed-cba987654321"),

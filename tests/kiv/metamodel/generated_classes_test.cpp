@@ -301,12 +301,8 @@ TEST_F(GeneratedClasses, ReflectionFindsInheritedPropertiesInvokersAndInstances)
   auto dependency = kiv::Dependency::create(model);
   dependency.invoke(package.getDependency_load_operation(), {});  // no repository: nothing to load from
   dependency->setRepository(repository);
-  try {
-    dependency.invoke(package.getDependency_load_operation(), {});
-    FAIL() << "load was not forwarded";
-  } catch (const Exception<msg::NotImplemented>& e) {
-    EXPECT_NE(std::string(e.what()).find("kiv.LocalRepository.load"), std::string::npos) << e.what();
-  }
+  EXPECT_NO_THROW(
+      dependency.invoke(package.getDependency_load_operation(), {}));  // a local repository loads nothing
   auto commit = kiv::Commit::create(model);
   EXPECT_THROW(commit.invoke(package.getDependency_load_operation(), {}), Exception<msg::NoSuchOperation>);
   EXPECT_FALSE(package.getBranch_merge_operation()->getInvoker()) << "takes a strategy no value can hold";

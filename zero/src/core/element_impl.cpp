@@ -497,6 +497,7 @@ void ModelElement::Impl::destroy() {
   std::vector<Impl*> subtree;
   collectSubtree(subtree);
   Transaction transaction = model_->beginTransaction(false);
+  for (Impl* element : subtree) element->aboutToDestroy();
   for (Impl* element : subtree) {
     while (!element->incoming_.empty()) {
       const IncomingReference incoming = element->incoming_.back();

@@ -22,6 +22,8 @@ FOUNDATION_MESSAGE(catalog, CannotPush)
 FOUNDATION_MESSAGE(catalog, CannotRedo)
 FOUNDATION_MESSAGE(catalog, CannotUndo)
 FOUNDATION_MESSAGE(catalog, HeadDelete)
+FOUNDATION_MESSAGE(catalog, ModelsIdentical)
+FOUNDATION_MESSAGE(catalog, ModelsSwapped)
 FOUNDATION_MESSAGE(catalog, NoOrigin)
 FOUNDATION_MESSAGE(catalog, NoSuchElement, std::string)     // element uuid text
 FOUNDATION_MESSAGE(catalog, NoSuchElementCur, std::string)  // element uuid text

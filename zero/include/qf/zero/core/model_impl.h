@@ -75,6 +75,12 @@ class ModelImpl final : public RefCounted {
   // object per key, made on first request, dropped with the model. The framework never
   // reads it. A cache that must stay exact watches the elements it was built from.
   std::shared_ptr<void>& attachment(const void* key) { return attachments_[key]; }
+  // The attachment under `key`, or null; never makes one, so that a thread that only looks
+  // does not write to the model.
+  std::shared_ptr<void> findAttachment(const void* key) const {
+    const auto found = attachments_.find(key);
+    return found == attachments_.end() ? nullptr : found->second;
+  }
 
   // Proxies. resolveProxy returns the resident element for a proxy, loading it through
   // the proxy loader when one is set; raises "CannotResolveProxy" when neither works.

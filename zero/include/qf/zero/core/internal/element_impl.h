@@ -121,6 +121,12 @@ class ModelElement::Impl : public RefCounted {
   // its container. Rolled back exactly when the transaction is cancelled.
   void destroy();
 
+  // Called on each element of a subtree that destroy() is about to remove, inside its
+  // transaction and before any reference is cut, so that changes made here are undone
+  // with a cancelled destruction. An element class releases here what it holds outside
+  // the model (a listener on another model, for instance). The default does nothing.
+  virtual void aboutToDestroy() {}
+
   // Raw hooks of an element class.
   // A single-valued property: its value (empty Value when unset).
   virtual Value basicGetValue(const meta::Property& property) const = 0;

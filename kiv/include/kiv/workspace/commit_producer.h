@@ -1,0 +1,79 @@
+// CommitProducer: turns each committed transaction of a user model into one commit of
+// the workspace's repository, and rewrites the user model without making commits.
+//
+//   auto producer = std::make_shared<kiv::CommitProducer>(workspace, userModel);
+//   producer->attach();                 // now every committed user transaction is a commit
+//   producer->update(delta);            // applies a delta; no commit is made for it
+//
+// A workspace makes its producer in `init` and holds the only shared pointer to it; the
+// producer holds counted references to the workspace and the user model. The user model
+// holds the producer's listener registration, never the producer: the destructor
+// unregisters it.
+//
+// Threads: the producer runs on the thread that commits the user transaction. Its
+// `enabled` flag is the only guard against its own rewrites, so the user model and the
+// repository model must be used from one thread at a time.
+#pragma once
+
+#include "kiv/metamodel/workspace.h"
+#include "qf/zero/core/change_report.h"
+#include "qf/zero/core/listener.h"
+#include "qf/zero/core/model.h"
+
+#include <memory>
+
+namespace kiv {
+
+class CommitProducer : public qf::zero::Listener {
+ public:
+  using Report = qf::zero::ShallowChangeReport<qf::zero::ModelElement>;
+
+  // Disabled and unregistered until `attach`.
+  CommitProducer(Workspace workspace, qf::zero::Model model);
+  ~CommitProducer() override;
+  CommitProducer(const CommitProducer&) = delete;
+  CommitProducer& operator=(const CommitProducer&) = delete;
+
+  // Registers on the user model (when there is one) and enables production.
+  void attach();
+
+  // Called by the user model after each committed transaction. When enabled, makes one
+  // commit in the repository model whose parent is the head tip: created and modified
+  // elements are stored anew; a destroyed element's last content is taken from history.
+  // A transaction that changed nothing still makes a commit. Then hands the commit to the
+  // workspace, whose "CannotCommit" (context behind the head) propagates to the
+  // committer after the commit was made, unattached to any branch.
+  void transactionCommitted(const std::shared_ptr<Report>& report);
+
+  // Destroys every top-level element of the user model in one user transaction, without
+  // making a commit.
+  void clearModel();
+  // Applies `delta` to the user model in one user transaction, without making a commit.
+  // A failure leaves the user model as it was.
+  void update(const Delta& delta);
+  // Makes the user model hold exactly the elements of `state` (a whole state, such as a
+  // snapshot), in one user transaction and without making a commit: elements that `state`
+  // lacks are destroyed, the others are made or refreshed in place, so that handles to
+  // kept elements stay valid.
+  void replaceState(const Delta& state);
+
+  // Takes the other producer's workspace, model and state; registers on the model when the
+  // other one was enabled.
+  void copyFrom(const CommitProducer& other);
+
+  bool isEnabled() const noexcept { return enabled_; }
+  const Workspace& getWorkspace() const noexcept { return workspace_; }
+  const qf::zero::Model& getModel() const noexcept { return model_; }
+
+ private:
+  // Sets `enabled` false for its scope and restores the saved value on the normal path.
+  class Pause;
+  void detach() noexcept;
+
+  Workspace workspace_;
+  qf::zero::Model model_;
+  bool enabled_ = false;
+  bool registered_ = false;
+};
+
+}  // namespace kiv

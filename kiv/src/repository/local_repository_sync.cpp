@@ -1,0 +1,140 @@
+// Push, pull and the packet handlers of a local repository.
+#include "kiv/merge/merge_strategy.h"
+#include "kiv/messages/messages.h"
+#include "kiv/metamodel/branch_impl.h"
+#include "kiv/metamodel/local_repository_impl.h"
+#include "kiv/metamodel/protocol/history_impl.h"
+#include "qf/zero/core/messages.h"
+#include "qf/zero/core/model_impl.h"
+#include "qf/zero/core/report_exception.h"
+#include "qf/zero/core/transaction.h"
+#include "qf/zero/io/packet_transport.h"
+
+#include <nlohmann/json.hpp>
+
+namespace kiv {
+
+namespace {
+
+bool isPresent(const qf::zero::ModelElement& element) { return element && element.isLive(); }
+
+// An origin branch without a tip precedes everything: pushing onto it loses nothing.
+bool precedes(const Branch& theirs, const Branch& mine) {
+  return !isPresent(theirs->getTip()) || theirs->isPredecessorOf(mine);
+}
+
+Repository liveOrigin(const LocalRepository::Impl& repository) {
+  const Repository origin = repository.getOrigin();
+  if (!isPresent(origin)) qf::zero::reportException(messages::NoOrigin());
+  return origin;
+}
+
+// The history of a push: the origin's branches as they are, and ours as they will be.
+// Under "MergeFirst" a diverged branch of ours is merged with the origin's first.
+protocol::History describePush(LocalRepository::Impl& repository, const Repository& origin, PushMode mode) {
+  const LocalRepository self(&repository);
+  const protocol::History history = protocol::History::create(repository.getModel());
+  origin->syncCreated(self, [&](const Branch& mine) { history->getCurrentMutable().add(mine); });
+  origin->syncDeleted(self, [&](const Branch& theirs) { history->getPreviousMutable().add(theirs); });
+  origin->syncUpdated(self, [&](const Branch& theirs, const Branch& mine) {
+    if (!precedes(theirs, mine)) {
+      if (mode == PushMode::TryPush) qf::zero::reportException(messages::CannotPush());
+      const std::shared_ptr<IMergeStrategy>& strategy = repository.getIMergeStrategy();
+      if (!strategy) {
+        qf::zero::reportException(qf0::messages::ElementRequired(u"kiv.LocalRepository.IMergeStrategy"));
+      }
+      mine->merge(theirs, *strategy);
+    }
+    history->getPreviousMutable().add(theirs);
+    history->getCurrentMutable().add(mine);
+  });
+  return history;
+}
+
+// The origin takes the pushed branches over only if it is still in the state the history
+// was made against. In process, the pushing repository itself holds the branches the
+// history's current set names.
+void deliverPush(const LocalRepository& self, const Repository& origin, const protocol::History& history) {
+  if (!origin->canPush(history)) qf::zero::reportException(messages::CannotPush());
+  origin->syncBranches(self);
+}
+
+void dropHistory(const protocol::History& history) noexcept {
+  try {
+    if (isPresent(history)) {
+      qf::zero::Transaction transaction = history.getModel()->beginTransaction();
+      protocol::History(history).destroy();
+      transaction.commit();
+    }
+  } catch (...) {
+    // The history is scratch: leaving it behind loses nothing.
+  }
+}
+
+}  // namespace
+
+std::future<void> LocalRepository::Impl::push(PushMode mode) {
+  const Repository origin = liveOrigin(*this);
+  if (!origin->getIsBare()) qf::zero::reportException(messages::PushBare());
+  if (const Branch head = origin->getHead(); isPresent(head) && !canCheckout(head->getName())) {
+    qf::zero::reportException(messages::HeadDelete());
+  }
+  protocol::History history;
+  {
+    qf::zero::Transaction transaction = getModelImpl()->beginTransaction();
+    history = describePush(*this, origin, mode);
+    transaction.commit();
+  }
+  const LocalRepository self(this);
+  return std::async(std::launch::async, [self, origin, history] {
+    try {
+      deliverPush(self, origin, history);
+    } catch (...) {
+      dropHistory(history);
+      throw;
+    }
+    dropHistory(history);
+  });
+}
+
+std::future<void> LocalRepository::Impl::pull() {
+  const Repository origin = liveOrigin(*this);
+  const LocalRepository self(this);
+  return std::async(std::launch::async, [self, origin] { self->syncBranches(origin); });
+}
+
+// Remote peers register as observers through packets; the count decides whether change
+// notices go out on the transport.
+void LocalRepository::Impl::setOnReceive() {
+  const std::shared_ptr<qf::zero::io::PacketTransport>& transport = getPacketTransport();
+  if (!transport) return;
+  const LocalRepository self(this);
+  const auto ok = [] { return qf::zero::io::JSONPacket(toString(protocol::PacketType::OK), nullptr); };
+  transport->setPacketHandler(
+      toString(protocol::PacketType::AddRemoteObserver),
+      [self, ok](const qf::zero::io::JSONPacket&) -> boost::optional<qf::zero::io::JSONPacket> {
+        {
+          qf::zero::Transaction transaction = self.getModel()->beginTransaction();
+          self->setNumRemoteObservers(self->getNumRemoteObservers() + 1);
+          transaction.commit();
+        }
+        if (!self->getRepositoryListener()) self->addRepositoryListener();
+        return ok();
+      },
+      qf::zero::io::PacketPromiseMode::OnWorkerThread);
+  transport->setPacketHandler(
+      toString(protocol::PacketType::RemoveRemoteObserver),
+      [self, ok](const qf::zero::io::JSONPacket&) -> boost::optional<qf::zero::io::JSONPacket> {
+        {
+          qf::zero::Transaction transaction = self.getModel()->beginTransaction();
+          if (self->getNumRemoteObservers() > 0)
+            self->setNumRemoteObservers(self->getNumRemoteObservers() - 1);
+          transaction.commit();
+        }
+        self->removeRepositoryListener();
+        return ok();
+      },
+      qf::zero::io::PacketPromiseMode::OnWorkerThread);
+}
+
+}  // namespace kiv
