@@ -5,7 +5,6 @@
 #include "kiv/metamodel/commit_impl.h"
 #include "kiv/metamodel/local_repository_impl.h"
 #include "kiv/metamodel/meta_package_kiv.h"
-#include "kiv/metamodel/protocol/history_impl.h"
 #include "kiv/metamodel/workspace_impl.h"
 #include "kiv/repository/notice_executor.h"
 #include "kiv/workspace/commit_producer.h"

@@ -3,12 +3,12 @@
 #include "kiv/messages/messages.h"
 #include "kiv/metamodel/branch_impl.h"
 #include "kiv/metamodel/local_repository_impl.h"
-#include "kiv/metamodel/protocol/history_impl.h"
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/report_exception.h"
 #include "qf/zero/core/transaction.h"
 #include "qf/zero/io/packet_transport.h"
+#include "repository/history_branches.h"
 
 #include <nlohmann/json.hpp>
 
@@ -33,9 +33,11 @@ Repository liveOrigin(const LocalRepository::Impl& repository) {
 // Under "MergeFirst" a diverged branch of ours is merged with the origin's first.
 protocol::History describePush(LocalRepository::Impl& repository, const Repository& origin, PushMode mode) {
   const LocalRepository self(&repository);
-  const protocol::History history = protocol::History::create(repository.getModel());
-  origin->syncCreated(self, [&](const Branch& mine) { history->getCurrentMutable().add(mine); });
-  origin->syncDeleted(self, [&](const Branch& theirs) { history->getPreviousMutable().add(theirs); });
+  protocol::History history = protocol::History::create(repository.getModel());
+  std::vector<Branch> previous;
+  std::vector<Branch> current;
+  origin->syncCreated(self, [&](const Branch& mine) { current.push_back(mine); });
+  origin->syncDeleted(self, [&](const Branch& theirs) { previous.push_back(theirs); });
   origin->syncUpdated(self, [&](const Branch& theirs, const Branch& mine) {
     if (!precedes(theirs, mine)) {
       if (mode == PushMode::TryPush) qf::zero::reportException(messages::CannotPush());
@@ -45,9 +47,11 @@ protocol::History describePush(LocalRepository::Impl& repository, const Reposito
       }
       mine->merge(theirs, *strategy);
     }
-    history->getPreviousMutable().add(theirs);
-    history->getCurrentMutable().add(mine);
+    previous.push_back(theirs);
+    current.push_back(mine);
   });
+  repository::setBranches(history, true, previous);
+  repository::setBranches(history, false, current);
   return history;
 }
 

@@ -3,7 +3,7 @@
 #include "kiv/metamodel/commit_impl.h"
 #include "kiv/metamodel/local_repository_impl.h"
 #include "kiv/metamodel/meta_package_kiv.h"
-#include "kiv/metamodel/protocol/history_impl.h"
+#include "kiv/metamodel/protocol/history.h"
 #include "kiv/metamodel/repository_impl.h"
 #include "kiv/repository/aggregate_model_traverser.h"
 #include "kiv/repository/repository_listener.h"
@@ -16,6 +16,7 @@
 #include "qf/zero/io/json_serializer.h"
 #include "qf/zero/io/packet_transport.h"
 #include "qf/zero/io/serialization_output.h"
+#include "repository/history_branches.h"
 
 #include <nlohmann/json.hpp>
 
@@ -126,7 +127,7 @@ bool Repository::Impl::isEquivalent(const Repository& other) const {
 
 bool Repository::Impl::canPush(const protocol::History& history) const {
   if (!isPresent(history)) return false;
-  const std::vector<Branch> previous = history->getPrevious().getTypedValues();
+  const std::vector<Branch> previous = repository::branchesOf(history, true);
   if (branches_.size() != previous.size()) return false;
   for (const Branch& seen : previous) {
     if (!isPresent(seen) || !hasState(branchNamed(*this, seen->getName()), seen)) return false;
