@@ -5,6 +5,7 @@
 #include "kiv/metamodel/branch.h"
 #include "kiv/metamodel/meta_package_kiv.h"
 #include "kiv/metamodel/protocol/history.h"
+#include "qf/zero/core/reference_collection.h"
 #include "qf/zero/core/value.h"
 
 #include <vector>
@@ -16,25 +17,23 @@ inline const qf::zero::meta::Property& branchSet(bool previous) {
   return previous ? package.getHistory_previous() : package.getHistory_current();
 }
 
+inline qf::zero::ReferenceCollection& collectionOf(const protocol::History& history, bool previous) {
+  const qf::zero::Value held = history.getPropertyValue(branchSet(previous));
+  return *static_cast<qf::zero::ReferenceCollection*>(held.getValue<qf::zero::AbstractOwnedCollection*>());
+}
+
 // The branches of one set, proxies included as they are held.
 inline std::vector<Branch> branchesOf(const protocol::History& history, bool previous) {
   std::vector<Branch> result;
-  const qf::zero::Value held = history.getPropertyValue(branchSet(previous));
-  if (!held.isList()) return result;
-  for (const qf::zero::Value& item : held.getList()) {
-    result.push_back(qf::zero::elementCast<Branch>(item.getElement()));
+  for (const qf::zero::ModelElement& held : collectionOf(history, previous).getAllValuesAndProxies()) {
+    result.push_back(qf::zero::elementCast<Branch>(held));
   }
   return result;
 }
 
-// Replaces one set. REQUIRES: an open transaction on the history's model.
-inline void setBranches(protocol::History& history, bool previous, const std::vector<Branch>& branches) {
-  const qf::zero::meta::Property& property = branchSet(previous);
-  std::vector<qf::zero::Value> items;
-  items.reserve(branches.size());
-  for (const Branch& branch : branches)
-    items.push_back(qf::zero::Value::createElementValue(branch, property));
-  history.setPropertyValue(property, qf::zero::Value::list(std::move(items), property));
+// Adds to one set. REQUIRES: an open transaction on the history's model.
+inline void addBranch(const protocol::History& history, bool previous, const Branch& branch) {
+  collectionOf(history, previous).add(branch);
 }
 
 }  // namespace kiv::repository

@@ -33,11 +33,9 @@ Repository liveOrigin(const LocalRepository::Impl& repository) {
 // Under "MergeFirst" a diverged branch of ours is merged with the origin's first.
 protocol::History describePush(LocalRepository::Impl& repository, const Repository& origin, PushMode mode) {
   const LocalRepository self(&repository);
-  protocol::History history = protocol::History::create(repository.getModel());
-  std::vector<Branch> previous;
-  std::vector<Branch> current;
-  origin->syncCreated(self, [&](const Branch& mine) { current.push_back(mine); });
-  origin->syncDeleted(self, [&](const Branch& theirs) { previous.push_back(theirs); });
+  const protocol::History history = protocol::History::create(repository.getModel());
+  origin->syncCreated(self, [&](const Branch& mine) { repository::addBranch(history, false, mine); });
+  origin->syncDeleted(self, [&](const Branch& theirs) { repository::addBranch(history, true, theirs); });
   origin->syncUpdated(self, [&](const Branch& theirs, const Branch& mine) {
     if (!precedes(theirs, mine)) {
       if (mode == PushMode::TryPush) qf::zero::reportException(messages::CannotPush());
@@ -47,11 +45,9 @@ protocol::History describePush(LocalRepository::Impl& repository, const Reposito
       }
       mine->merge(theirs, *strategy);
     }
-    previous.push_back(theirs);
-    current.push_back(mine);
+    repository::addBranch(history, true, theirs);
+    repository::addBranch(history, false, mine);
   });
-  repository::setBranches(history, true, previous);
-  repository::setBranches(history, false, current);
   return history;
 }
 
