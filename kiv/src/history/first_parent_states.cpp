@@ -35,8 +35,11 @@ std::optional<ObjectStorage> FirstParentStates::find(const Commit& tip, const qf
       extendTo(tip);
     } else {
       // A single question at another line is cheaper walked than indexed; the second
-      // in a row, as recording a commit asks, pays for the index.
-      if (lastMiss_ != tip) {
+      // in a row pays for the index: a second question at one tip, as recording a commit
+      // of several elements asks, or one at a child of the last tip asked, as recording
+      // commits of one element each on a branch does.
+      const bool followsLastMiss = lastMiss_ && heldFirstParent(tip) == lastMiss_;
+      if (lastMiss_ != tip && !followsLastMiss) {
         lastMiss_ = tip;
         return std::nullopt;
       }
