@@ -60,16 +60,14 @@ LocalRepository LocalRepository::Impl::create(const qf::zero::Model& repositoryM
 }
 
 void LocalRepository::Impl::init(RepoType type) {
-  {
-    qf::zero::Transaction transaction = beginOn(*this);
-    const Branch master = Branch::create(getModel());
-    master->setName(u"master");
-    add(master);
-    setHead(master);
-    setIsBare(type == RepoType::Bare);
-    transaction.commit();
-  }
+  qf::zero::Transaction transaction = beginOn(*this);
+  const Branch master = Branch::create(getModel());
+  master->setName(u"master");
+  add(master);
+  setHead(master);
+  setIsBare(type == RepoType::Bare);
   setDefaultMergeStrategy();
+  transaction.commit();
 }
 
 LocalRepository LocalRepository::Impl::clone(const Repository& origin, RepoType type) {

@@ -180,17 +180,19 @@ void Repository::Impl::syncBranches(const Repository& other) {
   sync(other, [](const Branch& mine, const Branch& theirs) { mine->update(theirs); });
 }
 
+// The observer and its listener come in one transaction: a veto leaves neither.
 void Repository::Impl::addRepositoryObserver(const RepositoryObserver& observer) {
-  if (!isPresent(observer))
+  if (!isPresent(observer)) {
     qf::zero::reportException(qf0::messages::ElementRequired(u"kiv.Repository.addRepositoryObserver"));
-  {
-    qf::zero::Transaction transaction = beginOn(*this);
-    if (!observers_.contains(observer)) getObserversMutable().add(observer);
-    transaction.commit();
   }
+  qf::zero::Transaction transaction = beginOn(*this);
+  if (!observers_.contains(observer)) getObserversMutable().add(observer);
   addRepositoryListener();
+  transaction.commit();
 }
 
+// The listener is dropped after the observer's removal has committed, so that the
+// transaction that removes the last observer is not seen by the listener it drops.
 void Repository::Impl::removeRepositoryObserver(const RepositoryObserver& observer) {
   {
     qf::zero::Transaction transaction = beginOn(*this);

@@ -1,6 +1,7 @@
 #include "kiv/workspace/commit_producer.h"
 
 #include "kiv/history/element_reuse_model_builder.h"
+#include "kiv/messages/messages.h"
 #include "kiv/metamodel/branch_impl.h"
 #include "kiv/metamodel/commit_impl.h"
 #include "kiv/metamodel/delta_impl.h"
@@ -18,19 +19,36 @@
 
 namespace kiv {
 
-// The saved value comes back on every exit: a rewrite that failed must not leave the
+// The saved state comes back on every exit: a rewrite that failed must not leave the
 // producer deaf to the user's next transactions.
-class CommitProducer::Pause {
- public:
-  explicit Pause(bool& enabled) : enabled_(enabled), saved_(enabled) { enabled_ = false; }
-  ~Pause() { enabled_ = saved_; }
-  Pause(const Pause&) = delete;
-  Pause& operator=(const Pause&) = delete;
+CommitProducer::Rewrite::Rewrite(CommitProducer& producer)
+    : producer_(producer), saved_(producer.enabled_), transaction_(producer.model_->beginTransaction(false)) {
+  producer_.enabled_ = false;
+}
 
- private:
-  bool& enabled_;
-  bool saved_;
-};
+CommitProducer::Rewrite::~Rewrite() {
+  transaction_.cancel();
+  producer_.enabled_ = saved_;
+}
+
+void CommitProducer::Rewrite::update(const Delta& delta) {
+  qf::zero::io::JSONChangeReportSynchronizer::applyChangeReportVerbatim(
+      delta->toChangeReport(), producer_.model_, std::make_unique<ElementReuseModelBuilder>());
+}
+
+void CommitProducer::Rewrite::clearModel() {
+  for (qf::zero::ModelElement element : producer_.model_->getTopLevelElements()) element.destroy();
+}
+
+void CommitProducer::Rewrite::replaceState(const Delta& state) {
+  std::unordered_set<qf::zero::Uuid, boost::hash<qf::zero::Uuid>> kept;
+  for (const auto& [uuid, storage] : state->getCurrent().container()) kept.insert(uuid);
+  for (qf::zero::ModelElement element : producer_.model_->getInstances(
+           qf::zero::ModelElement::metaClass(), qf::zero::query::SearchClassMatchMode::IncludeSubclasses)) {
+    if (element.isLive() && kept.count(element.getUuid()) == 0) element.destroy();
+  }
+  update(state);
+}
 
 CommitProducer::CommitProducer(Workspace workspace, qf::zero::Model model)
     : workspace_(std::move(workspace)), model_(std::move(model)) {}
@@ -61,61 +79,82 @@ bool isUserElement(const qf::zero::ModelElement& element) {
 
 }  // namespace
 
-void CommitProducer::transactionCommitted(const std::shared_ptr<Report>& report) {
-  if (!enabled_) return;
+Commit CommitProducer::record(const Report& report) const {
   const LocalRepository repository = workspace_->getRepository();
-  const Branch head = repository->getHead();
+  const Branch head = repository ? repository->getHead() : Branch();
   const qf::zero::Model repositoryModel = workspace_.getModel();
+  const Commit commit = Commit::create(repositoryModel);
+  if (head && head.isLive() && head->getTip()) commit->addParent(head->getTip());
+  for (const qf::zero::ModelElement& element : report.getAdded()) {
+    if (isUserElement(element)) commit->addCreated(element);
+  }
+  for (const qf::zero::ModelElement& element : report.getModified()) {
+    if (isUserElement(element)) commit->addUpdated(element);
+  }
+  for (const qf::zero::ModelElement& element : report.getDestroyed()) {
+    if (!isUserElement(element)) continue;
+    Delta delta = commit->getDelta();
+    if (!delta || !delta.isLive()) {
+      delta = Delta::create(repositoryModel);
+      commit->setDelta(delta);
+    }
+    delta->addDeleted(commit->find(element.getUuid()));
+  }
+  return commit;
+}
+
+void CommitProducer::validateOnCommit(const std::shared_ptr<Report>& report) {
+  pending_.reset();
+  if (!enabled_) return;
+  Pending pending{workspace_.getModel()->beginTransaction(false), Commit(), false, report};
+  pending.commit = record(*report);
+  pending.attached = workspace_->canCommit();
+  if (pending.attached) workspace_->commit(pending.commit);
+  pending.transaction.prepare();
+  pending_ = std::move(pending);
+}
+
+void CommitProducer::transactionCommitted(const std::shared_ptr<Report>& report) {
+  std::optional<Pending> pending = std::move(pending_);
+  pending_.reset();
+  if (!enabled_) return;
+  if (pending && pending->report == report) {
+    pending->transaction.commit();
+    if (!pending->attached) qf::zero::reportException(messages::CannotCommit());
+    return;
+  }
+  // Another listener changed the user transaction after it was validated: the commit is
+  // made again from the final report.
+  if (pending) pending->transaction.cancel();
   Commit commit;
   {
-    qf::zero::Transaction transaction = repositoryModel->beginTransaction(false);
-    commit = Commit::create(repositoryModel);
-    if (head && head->getTip()) commit->addParent(head->getTip());
-    for (const qf::zero::ModelElement& element : report->getAdded()) {
-      if (isUserElement(element)) commit->addCreated(element);
-    }
-    for (const qf::zero::ModelElement& element : report->getModified()) {
-      if (isUserElement(element)) commit->addUpdated(element);
-    }
-    for (const qf::zero::ModelElement& element : report->getDestroyed()) {
-      if (!isUserElement(element)) continue;
-      Delta delta = commit->getDelta();
-      if (!delta || !delta.isLive()) {
-        delta = Delta::create(repositoryModel);
-        commit->setDelta(delta);
-      }
-      delta->addDeleted(commit->find(element.getUuid()));
-    }
+    qf::zero::Transaction transaction = workspace_.getModel()->beginTransaction(false);
+    commit = record(*report);
     transaction.commit();
   }
   workspace_->commit(commit);
 }
 
+void CommitProducer::transactionCanceled(bool /*vetoed*/, const std::shared_ptr<Report>& /*report*/) {
+  pending_.reset();
+}
+
 void CommitProducer::clearModel() {
-  Pause pause(enabled_);
-  qf::zero::Transaction transaction = model_->beginTransaction(false);
-  for (qf::zero::ModelElement element : model_->getTopLevelElements()) element.destroy();
-  transaction.commit();
+  Rewrite rewrite(*this);
+  rewrite.clearModel();
+  rewrite.transaction().commit();
 }
 
 void CommitProducer::update(const Delta& delta) {
-  Pause pause(enabled_);
-  qf::zero::io::JSONChangeReportSynchronizer::applyChangeReportVerbatim(
-      delta->toChangeReport(), model_, std::make_unique<ElementReuseModelBuilder>());
+  Rewrite rewrite(*this);
+  rewrite.update(delta);
+  rewrite.transaction().commit();
 }
 
 void CommitProducer::replaceState(const Delta& state) {
-  Pause pause(enabled_);
-  std::unordered_set<qf::zero::Uuid, boost::hash<qf::zero::Uuid>> kept;
-  for (const auto& [uuid, storage] : state->getCurrent().container()) kept.insert(uuid);
-  qf::zero::Transaction transaction = model_->beginTransaction(false);
-  for (qf::zero::ModelElement element : model_->getInstances(
-           qf::zero::ModelElement::metaClass(), qf::zero::query::SearchClassMatchMode::IncludeSubclasses)) {
-    if (element.isLive() && kept.count(element.getUuid()) == 0) element.destroy();
-  }
-  qf::zero::io::JSONChangeReportSynchronizer::applyChangeReportVerbatim(
-      state->toChangeReport(), model_, std::make_unique<ElementReuseModelBuilder>());
-  transaction.commit();
+  Rewrite rewrite(*this);
+  rewrite.replaceState(state);
+  rewrite.transaction().commit();
 }
 
 void CommitProducer::copyFrom(const CommitProducer& other) {

@@ -17,14 +17,19 @@ void loadContext(const Workspace& workspace) {
   }
   CommitProducer& producer = *workspace->getCommitProducer();
   qf::zero::Transaction transaction = workspace.getModel()->beginTransaction();
+  CommitProducer::Rewrite rewrite(producer);
   const Commit context = workspace->getContext();
   if (context && context.isLive()) {
     Delta state = context->getSnapshot();
-    producer.replaceState(state);
+    rewrite.replaceState(state);
     state.destroy();
   } else {
-    producer.clearModel();
+    rewrite.clearModel();
   }
+  // Prepared together: a veto of either transaction leaves both models as they were.
+  rewrite.transaction().prepare();
+  transaction.prepare();
+  rewrite.transaction().commit();
   transaction.commit();
 }
 

@@ -11,6 +11,7 @@
 #include "qf/zero/core/report_exception.h"
 #include "qf/zero/core/transaction.h"
 
+#include <exception>
 #include <functional>
 
 namespace kiv {
@@ -44,6 +45,49 @@ CommitProducer& producerOf(const Workspace::Impl& workspace) {
   const std::shared_ptr<CommitProducer>& producer = workspace.getCommitProducer();
   if (!producer) qf::zero::reportException(qf0::messages::ElementRequired(u"kiv.Workspace.commitProducer"));
   return *producer;
+}
+
+// Commits the user model's rewrite and the repository transaction together: both are
+// validated before either commits, so that a veto of either leaves both models as they
+// were. A listener that fails once the user transaction has closed does not stop the
+// repository's commit; its error is raised afterwards.
+void commitTogether(qf::zero::Transaction& repository, CommitProducer::Rewrite& rewrite) {
+  rewrite.transaction().prepare();
+  repository.prepare();
+  std::exception_ptr late;
+  try {
+    rewrite.transaction().commit();
+  } catch (...) {
+    late = std::current_exception();
+  }
+  repository.commit();
+  if (late) std::rethrow_exception(late);
+}
+
+// Rewrites the user model from the workspace's context to `target` inside `rewrite` and
+// records `target` as the context. The caller's repository transaction is open.
+void moveContext(Workspace::Impl& workspace, const Commit& target, CommitProducer::Rewrite& rewrite) {
+  const Commit from = workspace.getCtx();
+  workspace.setCtx(target);
+  if (!isPresent(target)) {
+    rewrite.clearModel();
+  } else if (!isPresent(from)) {
+    // The whole state of the new context: for an initial commit or a snapshot this is its
+    // own delta, and for any other commit it is what the user model must become.
+    Delta state = target->getSnapshot();
+    rewrite.update(state);
+    state.destroy();
+  } else if (from->isPredecessorOf(target)) {
+    Delta forward = target->diff(from);
+    rewrite.update(forward);
+    forward.destroy();
+  } else {
+    Delta difference = from->diff(target);
+    Delta backward = difference->invert();
+    difference.destroy();
+    rewrite.update(backward);
+    backward.destroy();
+  }
 }
 
 }  // namespace
@@ -101,9 +145,10 @@ void Workspace::Impl::undo() {
   qf::zero::Transaction transaction = beginOn(*this);
   Delta back = head->undo();
   setCtx(liveTipOf(head));
-  producerOf(*this).update(back);
+  CommitProducer::Rewrite rewrite(producerOf(*this));
+  rewrite.update(back);
   back.destroy();
-  transaction.commit();
+  commitTogether(transaction, rewrite);
 }
 
 // The redone commit's delta belongs to its commit: it is applied, never destroyed.
@@ -112,41 +157,23 @@ void Workspace::Impl::redo() {
   qf::zero::Transaction transaction = beginOn(*this);
   const Delta forward = head->redo();
   setCtx(liveTipOf(head));
-  if (isPresent(forward)) producerOf(*this).update(forward);
-  transaction.commit();
+  CommitProducer::Rewrite rewrite(producerOf(*this));
+  if (isPresent(forward)) rewrite.update(forward);
+  commitTogether(transaction, rewrite);
 }
 
 void Workspace::Impl::setContext(const Commit& commit, SetContextMode mode) {
   if (commit == ctx_) return;
-  CommitProducer& rewriter = producerOf(*this);
+  CommitProducer& producer = producerOf(*this);
   qf::zero::Transaction transaction = beginOn(*this);
-  const Commit from = ctx_;
-  setCtx(commit);
   if (mode == SetContextMode::BranchUpdate) {
     const Branch head = headOf(*this);
     head->setTip(commit);
     head->getRedoStackMutable().clear();
   }
-  if (!isPresent(commit)) {
-    rewriter.clearModel();
-  } else if (!isPresent(from)) {
-    // The whole state of the new context: for an initial commit or a snapshot this is its
-    // own delta, and for any other commit it is what the user model must become.
-    Delta state = commit->getSnapshot();
-    rewriter.update(state);
-    state.destroy();
-  } else if (from->isPredecessorOf(commit)) {
-    Delta forward = commit->diff(from);
-    rewriter.update(forward);
-    forward.destroy();
-  } else {
-    Delta difference = from->diff(commit);
-    Delta backward = difference->invert();
-    difference.destroy();
-    rewriter.update(backward);
-    backward.destroy();
-  }
-  transaction.commit();
+  CommitProducer::Rewrite rewrite(producer);
+  moveContext(*this, commit, rewrite);
+  commitTogether(transaction, rewrite);
 }
 
 void Workspace::Impl::branch(const std::u16string& name) {
@@ -168,10 +195,13 @@ void Workspace::Impl::checkout(const std::u16string& name) {
   if (!isPresent(repository) || !repository->canCheckout(name)) {
     qf::zero::reportException(messages::CannotCheckout(name));
   }
+  CommitProducer& producer = producerOf(*this);
   qf::zero::Transaction transaction = beginOn(*this);
   repository->checkout(name);
-  setContext(liveTipOf(repository->getHead()), SetContextMode::ContextOnly);
-  transaction.commit();
+  CommitProducer::Rewrite rewrite(producer);
+  const Commit target = liveTipOf(repository->getHead());
+  if (target != ctx_) moveContext(*this, target, rewrite);
+  commitTogether(transaction, rewrite);
 }
 
 void Workspace::Impl::merge(const std::u16string& name) {
@@ -183,12 +213,15 @@ void Workspace::Impl::merge(const std::u16string& name) {
   if (!strategy)
     qf::zero::reportException(qf0::messages::ElementRequired(u"kiv.LocalRepository.IMergeStrategy"));
   const Branch head = headOf(*this);
+  CommitProducer& producer = producerOf(*this);
   const auto& branches = repository->getBranches().container();
   const auto other = branches.find(name);
   qf::zero::Transaction transaction = beginOn(*this);
   head->merge(other == branches.end() ? Branch() : other->second, *strategy);
-  setContext(liveTipOf(head), SetContextMode::ContextOnly);
-  transaction.commit();
+  CommitProducer::Rewrite rewrite(producer);
+  const Commit target = liveTipOf(head);
+  if (target != ctx_) moveContext(*this, target, rewrite);
+  commitTogether(transaction, rewrite);
 }
 
 void Workspace::Impl::commit(const Commit& commit) {

@@ -338,20 +338,13 @@ std::shared_ptr<ReportData> ModelImpl::buildReport(bool deep, const boost::optio
   return std::make_shared<ShallowChangeReport<ModelElement>>(model, std::move(entries), result);
 }
 
-void ModelImpl::commitOutermost(boost::optional<Value> result) {
+std::shared_ptr<ReportData> ModelImpl::validateOutermost(
+    const std::vector<std::shared_ptr<ListenerHolderBase>>& holders, const boost::optional<Value>& result) {
   TransactionState& state = *txn_;
-  if (state.levels.back().aborted) {
-    cancelLevel(0);
-    reportException(qf0::messages::TransactionAborted());
-  }
-  auto holders = listeners_;
-  for (auto& holder : holders) holder->reattach();
   const bool deep = std::any_of(holders.begin(), holders.end(), [](const auto& h) { return h->isDeep(); });
-  const bool needsReport = !holders.empty();
-
   std::shared_ptr<ReportData> report;
   try {
-    if (needsReport) {
+    if (!holders.empty()) {
       state.phase = TransactionState::Phase::Validating;
       report = buildReport(deep, result);
       forEachListener(holders, [&](ListenerHolderBase& h) {
@@ -381,6 +374,34 @@ void ModelImpl::commitOutermost(boost::optional<Value> result) {
     }
     throw;
   }
+  return report;
+}
+
+void ModelImpl::prepareOutermost() {
+  TransactionState& state = *txn_;
+  if (state.levels.back().aborted) {
+    cancelLevel(0);
+    reportException(qf0::messages::TransactionAborted());
+  }
+  auto holders = listeners_;
+  for (auto& holder : holders) holder->reattach();
+  state.preparedReport = validateOutermost(holders, boost::none);
+  state.phase = TransactionState::Phase::Open;
+  state.preparedAt = state.changeCount;
+  state.prepared = true;
+}
+
+void ModelImpl::commitOutermost(boost::optional<Value> result) {
+  TransactionState& state = *txn_;
+  if (state.levels.back().aborted) {
+    cancelLevel(0);
+    reportException(qf0::messages::TransactionAborted());
+  }
+  auto holders = listeners_;
+  for (auto& holder : holders) holder->reattach();
+  const bool stillPrepared = state.prepared && state.preparedAt == state.changeCount && !result;
+  const std::shared_ptr<ReportData> report =
+      stillPrepared ? state.preparedReport : validateOutermost(holders, result);
 
   state.phase = TransactionState::Phase::Closing;
   for (ElementRecord& record : state.records) {

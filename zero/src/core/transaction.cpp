@@ -41,6 +41,18 @@ void Transaction::commit(boost::optional<Value> result) {
   model_->commitLevel(level_, std::move(result));
 }
 
+void Transaction::prepare() {
+  if (!open_ || !model_->txn_) reportException(qf0::messages::TransactionNotOpen());
+  if (level_ != 0) return;
+  if (model_->txn_->currentLevel() != 0) reportException(qf0::messages::TransactionNotOpen());
+  try {
+    model_->prepareOutermost();
+  } catch (...) {
+    open_ = false;
+    throw;
+  }
+}
+
 void Transaction::cancel() noexcept {
   if (!open_) return;
   open_ = false;

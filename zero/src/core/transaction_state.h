@@ -2,6 +2,7 @@
 // savepoint level created or destroyed it and the old-value storage of each level.
 #pragma once
 
+#include "qf/zero/core/change_report.h"
 #include "qf/zero/core/internal/storage.h"
 #include "qf/zero/core/value.h"
 
@@ -48,6 +49,11 @@ struct TransactionState {
   // changed nothing and needs no abort.
   std::uint64_t changeCount = 0;
   Phase phase = Phase::Open;
+  // Set by a prepare: the report its listeners passed, valid while changeCount stays at
+  // preparedAt.
+  std::shared_ptr<ReportData> preparedReport;
+  std::uint64_t preparedAt = 0;
+  bool prepared = false;
 
   int currentLevel() const noexcept { return static_cast<int>(levels.size()) - 1; }
   // Lists `record` at the current level (once).

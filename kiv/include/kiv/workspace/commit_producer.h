@@ -15,12 +15,15 @@
 // repository model must be used from one thread at a time.
 #pragma once
 
+#include "kiv/metamodel/commit.h"
 #include "kiv/metamodel/workspace.h"
 #include "qf/zero/core/change_report.h"
 #include "qf/zero/core/listener.h"
 #include "qf/zero/core/model.h"
+#include "qf/zero/core/transaction.h"
 
 #include <memory>
+#include <optional>
 
 namespace kiv {
 
@@ -37,13 +40,43 @@ class CommitProducer : public qf::zero::Listener {
   // Registers on the user model (when there is one) and enables production.
   void attach();
 
-  // Called by the user model after each committed transaction. When enabled, makes one
-  // commit in the repository model whose parent is the head tip: created and modified
-  // elements are stored anew; a destroyed element's last content is taken from history.
-  // A transaction that changed nothing still makes a commit. Then hands the commit to the
-  // workspace, whose "CannotCommit" (context behind the head) propagates to the
-  // committer after the commit was made, unattached to any branch.
+  // A committed user transaction becomes one commit in the repository model whose parent
+  // is the head tip: created and modified elements are stored anew; a destroyed element's
+  // last content is taken from history. A transaction that changed nothing still makes a
+  // commit. The workspace then appends it to the head; when the workspace's context is
+  // behind the head, "CannotCommit" reaches the committer after the commit was made,
+  // unattached to any branch.
+  //
+  // The commit is made while the user transaction is validated, in a repository
+  // transaction that is prepared then and committed once the user transaction has
+  // committed: a veto of the repository transaction vetoes the user's, and a veto of the
+  // user's cancels the commit. Nothing is recorded while production is disabled.
+  void validateOnCommit(const std::shared_ptr<Report>& report);
   void transactionCommitted(const std::shared_ptr<Report>& report);
+  void transactionCanceled(bool vetoed, const std::shared_ptr<Report>& report);
+
+  // An open user transaction in which the producer makes no commit. The workspace rewrites
+  // the user model inside one and commits it together with its repository transaction
+  // (prepare both, then commit both), so that a veto of either changes neither model.
+  // Destruction cancels the transaction when it is still open, then production resumes
+  // as it was.
+  class Rewrite {
+   public:
+    explicit Rewrite(CommitProducer& producer);
+    ~Rewrite();
+    Rewrite(const Rewrite&) = delete;
+    Rewrite& operator=(const Rewrite&) = delete;
+
+    void update(const Delta& delta);
+    void clearModel();
+    void replaceState(const Delta& state);
+    qf::zero::Transaction& transaction() noexcept { return transaction_; }
+
+   private:
+    CommitProducer& producer_;
+    bool saved_;
+    qf::zero::Transaction transaction_;
+  };
 
   // Destroys every top-level element of the user model in one user transaction, without
   // making a commit.
@@ -66,14 +99,23 @@ class CommitProducer : public qf::zero::Listener {
   const qf::zero::Model& getModel() const noexcept { return model_; }
 
  private:
-  // Sets `enabled` false for its scope and restores the saved value on the normal path.
-  class Pause;
   void detach() noexcept;
+  // Makes the commit of `report` in the open repository transaction.
+  Commit record(const Report& report) const;
+
+  // The commit made while validating, waiting for the user transaction to commit.
+  struct Pending {
+    qf::zero::Transaction transaction;
+    Commit commit;
+    bool attached = false;
+    std::shared_ptr<Report> report;
+  };
 
   Workspace workspace_;
   qf::zero::Model model_;
   bool enabled_ = false;
   bool registered_ = false;
+  std::optional<Pending> pending_;
 };
 
 }  // namespace kiv

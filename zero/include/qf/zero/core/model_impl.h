@@ -125,6 +125,11 @@ class ModelImpl final : public RefCounted {
   void commitLevel(int level, boost::optional<Value> result);
   void cancelLevel(int level) noexcept;
   void commitOutermost(boost::optional<Value> result);
+  void prepareOutermost();
+  // Runs validateOnCommit and modifyOnCommit and returns the report they saw; a failure
+  // rolls the transaction back, closes it, tells the cancel observers and is rethrown.
+  std::shared_ptr<ReportData> validateOutermost(
+      const std::vector<std::shared_ptr<ListenerHolderBase>>& holders, const boost::optional<Value>& result);
   void rollbackLevel(int level) noexcept;
   std::shared_ptr<ReportData> buildReport(bool deep, const boost::optional<Value>& result);
   void closeTransaction() noexcept;

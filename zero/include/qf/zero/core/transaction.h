@@ -37,6 +37,13 @@ class Transaction {
   // Raises "TransactionNotOpen" when already closed.
   void commit();
   void commit(boost::optional<Value> result);
+  // Runs the outermost transaction's validateOnCommit and modifyOnCommit now and keeps it
+  // open: a commit without a result that follows with no change in between cannot be
+  // vetoed any more. Two models are then changed together: prepare both, commit both. A
+  // veto cancels the whole transaction, closes it and reaches the caller. No effect on a
+  // savepoint or a joined transaction (the outermost one decides). Raises
+  // "TransactionNotOpen" when closed.
+  void prepare();
   // Undoes every change made since this transaction began. No effect when closed.
   void cancel() noexcept;
   bool isOpen() const noexcept { return open_; }
