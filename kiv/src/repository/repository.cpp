@@ -1,3 +1,4 @@
+#include "foundation/core/except/exception.h"
 #include "kiv/messages/messages.h"
 #include "kiv/metamodel/branch_impl.h"
 #include "kiv/metamodel/commit_impl.h"
@@ -117,12 +118,15 @@ bool Repository::Impl::isEquivalent(const Repository& other) const {
   const std::map<std::u16string, Branch> mine(branches_.container().begin(), branches_.container().end());
   const auto& theirsMap = other->getBranches().container();
   const std::map<std::u16string, Branch> theirs(theirsMap.begin(), theirsMap.end());
+  // A branch compares its own redo stack only: asked from both sides, the answer does not
+  // depend on which repository asks.
   if (!Branch::Impl::areBranchMapsEquivalent(mine, theirs)) return false;
+  if (!Branch::Impl::areBranchMapsEquivalent(theirs, mine)) return false;
   const Branch myHead = getHead();
   const Branch theirHead = other->getHead();
   if (!myHead || !theirHead) return !myHead && !theirHead;
-  if (!isPresent(theirHead)) return false;
-  return theirHead->isEquivalent(myHead, true);
+  if (!isPresent(theirHead) || !isPresent(myHead)) return false;
+  return theirHead->isEquivalent(myHead, true) && myHead->isEquivalent(theirHead, true);
 }
 
 bool Repository::Impl::canPush(const protocol::History& history) const {
@@ -245,8 +249,12 @@ void Repository::Impl::notifyObservers() {
   }
   if (getNumRemoteObservers() >= 1) {
     if (const auto& transport = getPacketTransport()) {
-      transport->sendPacket(
-          qf::zero::io::JSONPacket(toString(protocol::PacketType::RepositoryModified), nullptr));
+      try {
+        transport->sendPacket(
+            qf::zero::io::JSONPacket(toString(protocol::PacketType::RepositoryModified), nullptr));
+      } catch (const foundation::core::except::ExceptionBase&) {
+        // A peer that went away hears nothing more; the change it missed has been made.
+      }
     }
   }
   if (failure) std::rethrow_exception(failure);

@@ -81,12 +81,21 @@ void moveContext(Workspace::Impl& workspace, const Commit& target, CommitProduce
     Delta forward = target->diff(from);
     rewrite.update(forward);
     forward.destroy();
-  } else {
+  } else if (target->isPredecessorOf(from)) {
     Delta difference = from->diff(target);
     Delta backward = difference->invert();
     difference.destroy();
     rewrite.update(backward);
     backward.destroy();
+  } else {
+    // Lines that went apart, or never met: from one whole state to the other. (A diff
+    // across unrelated lines leaves an initial commit's own state in place.)
+    Delta to = target->getSnapshot();
+    Delta away = from->getSnapshot();
+    Delta back = away->invert();
+    Delta across = Delta::Impl::compose({to, back});
+    rewrite.update(across);
+    for (Delta* scratch : {&to, &away, &back, &across}) scratch->destroy();
   }
 }
 
@@ -224,10 +233,17 @@ void Workspace::Impl::merge(const std::u16string& name) {
   commitTogether(transaction, rewrite);
 }
 
+// A commit that records nothing (a transaction that changed nothing) is not taken: it
+// would sit at the tip as a step that cannot be undone. It is destroyed instead.
 void Workspace::Impl::commit(const Commit& commit) {
   if (!canCommit()) qf::zero::reportException(messages::CannotCommit());
   const Branch head = headOf(*this);
   qf::zero::Transaction transaction = beginOn(*this);
+  if (isPresent(commit) && commit->isEmpty() && commit->getParent() == ctx_ && ctx_) {
+    Commit(commit).destroy();
+    transaction.commit();
+    return;
+  }
   head->commit(commit);
   setCtx(commit);
   transaction.commit();

@@ -212,3 +212,45 @@ TEST(TransactionEnds, MisuseIsRefusedClearly) {
 
 }  // namespace
 }  // namespace qf::zero
+
+namespace qf::zero {
+namespace {
+
+// A prepared transaction has passed its validation: committing it without further change
+// runs no validator again; a change after the prepare is validated at the commit; a veto
+// in the prepare cancels and closes the transaction.
+TEST_F(Listeners, APreparedTransactionCommitsWithoutASecondValidation) {
+  struct Row {
+    const char* name;
+    bool changeAfterPrepare;
+    bool vetoInPrepare;
+  };
+  for (const Row& row :
+       {Row{"prepared", false, false}, Row{"changed after", true, false}, Row{"vetoed", false, true}}) {
+    SCOPED_TRACE(row.name);
+    journal.calls.clear();
+    journal.onValidate = nullptr;
+    if (row.vetoInPrepare) journal.onValidate = [](const Report&) { throw std::runtime_error("no"); };
+    const std::string before = support::dumpModel(model);
+    Transaction transaction = model->beginTransaction();
+    make();
+    if (row.vetoInPrepare) {
+      EXPECT_THROW(transaction.prepare(), std::runtime_error);
+      EXPECT_FALSE(transaction.isOpen());
+      EXPECT_EQ(support::dumpModel(model), before);
+      EXPECT_EQ(journal.calls, (std::vector<std::string>{"validate", "canceled"}));
+      continue;
+    }
+    transaction.prepare();
+    EXPECT_TRUE(transaction.isOpen());
+    if (row.changeAfterPrepare) make();
+    transaction.commit();
+    const std::vector<std::string> once{"validate", "modify", "committed"};
+    const std::vector<std::string> twice{"validate", "modify", "validate", "modify", "committed"};
+    EXPECT_EQ(journal.calls, row.changeAfterPrepare ? twice : once);
+    EXPECT_EQ(journal.committed->getAdded().size(), row.changeAfterPrepare ? 2u : 1u);
+  }
+}
+
+}  // namespace
+}  // namespace qf::zero
