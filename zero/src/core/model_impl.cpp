@@ -377,14 +377,19 @@ std::shared_ptr<ReportData> ModelImpl::validateOutermost(
   return report;
 }
 
-void ModelImpl::prepareOutermost() {
-  TransactionState& state = *txn_;
-  if (state.levels.back().aborted) {
+std::vector<std::shared_ptr<ListenerHolderBase>> ModelImpl::listenersForClosing() {
+  if (txn_->levels.back().aborted) {
     cancelLevel(0);
     reportException(qf0::messages::TransactionAborted());
   }
   auto holders = listeners_;
   for (auto& holder : holders) holder->reattach();
+  return holders;
+}
+
+void ModelImpl::prepareOutermost() {
+  TransactionState& state = *txn_;
+  const auto holders = listenersForClosing();
   state.preparedReport = validateOutermost(holders, boost::none);
   state.phase = TransactionState::Phase::Open;
   state.preparedAt = state.changeCount;
@@ -393,12 +398,7 @@ void ModelImpl::prepareOutermost() {
 
 void ModelImpl::commitOutermost(boost::optional<Value> result) {
   TransactionState& state = *txn_;
-  if (state.levels.back().aborted) {
-    cancelLevel(0);
-    reportException(qf0::messages::TransactionAborted());
-  }
-  auto holders = listeners_;
-  for (auto& holder : holders) holder->reattach();
+  const auto holders = listenersForClosing();
   const bool stillPrepared = state.prepared && state.preparedAt == state.changeCount && !result;
   const std::shared_ptr<ReportData> report =
       stillPrepared ? state.preparedReport : validateOutermost(holders, result);

@@ -126,6 +126,9 @@ class ModelImpl final : public RefCounted {
   void cancelLevel(int level) noexcept;
   void commitOutermost(boost::optional<Value> result);
   void prepareOutermost();
+  // The listeners that see the outermost transaction close; raises "TransactionAborted"
+  // (after cancelling) when a joined operation failed inside it.
+  std::vector<std::shared_ptr<ListenerHolderBase>> listenersForClosing();
   // Runs validateOnCommit and modifyOnCommit and returns the report they saw; a failure
   // rolls the transaction back, closes it, tells the cancel observers and is rethrown.
   std::shared_ptr<ReportData> validateOutermost(
