@@ -68,4 +68,9 @@ bool ObjectStorage::Impl::isEqual(const ObjectStorage& other) const {
   return other.getImpl() == this || other->content_ == content_;
 }
 
+bool ObjectStorage::Impl::hasSameContent(const ObjectStorage& other) const {
+  if (!history::isLive(other) || other->isEmpty() || isEmpty()) return false;
+  return other.getImpl() == this || (other->elementUUID_ == elementUUID_ && other->content_ == content_);
+}
+
 }  // namespace kiv

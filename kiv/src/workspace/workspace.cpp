@@ -1,3 +1,4 @@
+#include "kiv/history/state_difference.h"
 #include "kiv/merge/merge_strategy.h"
 #include "kiv/messages/messages.h"
 #include "kiv/metamodel/branch_impl.h"
@@ -64,8 +65,23 @@ void commitTogether(qf::zero::Transaction& repository, CommitProducer::Rewrite& 
   if (late) std::rethrow_exception(late);
 }
 
+bool holdsWholeState(const Commit& commit) {
+  const Delta delta = isPresent(commit) ? commit->getDelta() : Delta();
+  return isPresent(delta) && delta->getIsSnapshot();
+}
+
+// Applies `delta` inside `rewrite` and destroys it: it is a temporary of the repository model.
+void applyAndDrop(CommitProducer::Rewrite& rewrite, Delta delta) {
+  rewrite.update(delta);
+  delta.destroy();
+}
+
 // Rewrites the user model from the workspace's context to `target` inside `rewrite` and
 // records `target` as the context. The caller's repository transaction is open.
+// A whole state on the way (a snapshot, a merge's result) composes wrongly: inverted it
+// deletes every element it holds, and a merge's state names no element of the merged-in
+// line that it dropped. Such a way, and lines that went apart or never met, are crossed
+// by comparing the two states.
 void moveContext(Workspace::Impl& workspace, const Commit& target, CommitProducer::Rewrite& rewrite) {
   const Commit from = workspace.getCtx();
   workspace.setCtx(target);
@@ -74,28 +90,20 @@ void moveContext(Workspace::Impl& workspace, const Commit& target, CommitProduce
   } else if (!isPresent(from)) {
     // The whole state of the new context: for an initial commit or a snapshot this is its
     // own delta, and for any other commit it is what the user model must become.
-    Delta state = target->getSnapshot();
-    rewrite.update(state);
-    state.destroy();
-  } else if (from->isPredecessorOf(target)) {
-    Delta forward = target->diff(from);
-    rewrite.update(forward);
-    forward.destroy();
-  } else if (target->isPredecessorOf(from)) {
-    Delta difference = from->diff(target);
-    Delta backward = difference->invert();
-    difference.destroy();
-    rewrite.update(backward);
-    backward.destroy();
+    applyAndDrop(rewrite, target->getSnapshot());
+  } else if (const std::vector<Commit> ahead = target->findPath(from); !ahead.empty()) {
+    applyAndDrop(rewrite, crossesWholeState(ahead) ? stateDifference(from, target) : target->diff(from));
+  } else if (const std::vector<Commit> behind = from->findPath(target); !behind.empty()) {
+    if (crossesWholeState(behind)) {
+      applyAndDrop(rewrite, stateDifference(from, target));
+    } else {
+      Delta difference = from->diff(target);
+      Delta backward = difference->invert();
+      difference.destroy();
+      applyAndDrop(rewrite, backward);
+    }
   } else {
-    // Lines that went apart, or never met: from one whole state to the other. (A diff
-    // across unrelated lines leaves an initial commit's own state in place.)
-    Delta to = target->getSnapshot();
-    Delta away = from->getSnapshot();
-    Delta back = away->invert();
-    Delta across = Delta::Impl::compose({to, back});
-    rewrite.update(across);
-    for (Delta* scratch : {&to, &away, &back, &across}) scratch->destroy();
+    applyAndDrop(rewrite, stateDifference(from, target));
   }
 }
 
@@ -149,25 +157,39 @@ void Workspace::Impl::takeSnapshot() {
 
 // The user model is rewritten last, after every change of the repository model, so that a
 // failure anywhere leaves both models as they were.
+// Stepping back over a whole state (a snapshot, a merge's result) compares the two
+// states: the inverse of a whole state would delete every element it holds.
 void Workspace::Impl::undo() {
   const Branch head = headOf(*this);
   qf::zero::Transaction transaction = beginOn(*this);
+  const Commit undone = liveTipOf(head);
   Delta back = head->undo();
-  setCtx(liveTipOf(head));
+  const Commit tip = liveTipOf(head);
+  setCtx(tip);
+  if (holdsWholeState(undone)) {
+    back.destroy();
+    back = stateDifference(undone, tip);
+  }
   CommitProducer::Rewrite rewrite(producerOf(*this));
-  rewrite.update(back);
-  back.destroy();
+  applyAndDrop(rewrite, back);
   commitTogether(transaction, rewrite);
 }
 
-// The redone commit's delta belongs to its commit: it is applied, never destroyed.
+// The redone commit's delta belongs to its commit: it is applied, never destroyed. A
+// whole state is reached, as undo leaves it, by comparing the two states.
 void Workspace::Impl::redo() {
   const Branch head = headOf(*this);
   qf::zero::Transaction transaction = beginOn(*this);
+  const Commit before = liveTipOf(head);
   const Delta forward = head->redo();
-  setCtx(liveTipOf(head));
+  const Commit tip = liveTipOf(head);
+  setCtx(tip);
   CommitProducer::Rewrite rewrite(producerOf(*this));
-  if (isPresent(forward)) rewrite.update(forward);
+  if (holdsWholeState(tip)) {
+    applyAndDrop(rewrite, stateDifference(before, tip));
+  } else if (isPresent(forward)) {
+    rewrite.update(forward);
+  }
   commitTogether(transaction, rewrite);
 }
 

@@ -1,6 +1,7 @@
 // Properties of recorded histories: seeded random edits of a small user model, recorded
 // as commits on branching lines with hand-built merge commits.
 #include "history_fixture.h"
+#include "kiv/history/state_difference.h"
 #include "kiv/metamodel/branch_impl.h"
 #include "support/random_editor.h"
 
@@ -100,6 +101,33 @@ TEST_P(HistoryProperties, ApplyingADiffToTheStateAtItsBaseGivesTheStateAtItsTarg
     ASSERT_EQ(stateOf(user), history.state(a));
   }
   EXPECT_LE(keyTrades, 3) << "applying refuses more than the rare trade of map keys";
+}
+
+// Unlike a diff, the difference of two states holds across merges, between unrelated
+// commits and towards or from the empty state.
+TEST_P(HistoryProperties, TheDifferenceOfTwoStatesTakesOneStateToTheOther) {
+  for (int sample = 0; sample < 60; ++sample) {
+    const std::size_t a = history.pickAny();
+    const std::size_t b = history.pickAny();
+    const bool fromEmpty = sample % 10 == 0;
+    const bool toEmpty = sample % 10 == 5;
+    SCOPED_TRACE("from commit " + std::to_string(a) + (fromEmpty ? " (empty)" : "") + " to commit " +
+                 std::to_string(b) + (toEmpty ? " (empty)" : ""));
+    const Model user = fromEmpty ? Model::create() : history.modelAt(a);
+    const kiv::Delta difference = kiv::stateDifference(fromEmpty ? kiv::Commit() : history.commit(a),
+                                                       toEmpty ? kiv::Commit() : history.commit(b));
+    if (a == b && !fromEmpty && !toEmpty) ASSERT_TRUE(difference->isEmpty());
+    try {
+      apply(difference, user);
+    } catch (const Exception<qf0::messages::UniquenessConstraint>&) {
+      continue;  // two elements trading map keys, as above
+    }
+    if (toEmpty) {
+      ASSERT_TRUE(stateOf(user).empty());
+    } else {
+      ASSERT_EQ(stateOf(user), history.state(b));
+    }
+  }
 }
 
 TEST_P(HistoryProperties, ASnapshotAppliedToAnEmptyModelGivesTheStateAtItsCommit) {

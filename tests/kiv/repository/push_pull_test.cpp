@@ -118,7 +118,9 @@ TEST_P(Push, RefusedOrTakenOverByTheOrigin) {
   const State userA = stateOf(a.user), userB = stateOf(b.user);
   std::future<void> stray;
   EXPECT_TRUE(refusedWith(row.outcome, [&] { stray = pusher->push(row.mode); }));
-  if (stray.valid()) ASSERT_TRUE(finishes(stray));
+  if (stray.valid()) {
+    ASSERT_TRUE(finishes(stray));
+  }
   EXPECT_EQ(dumpOf(repositories), before) << "a refused push changes nothing";
   EXPECT_EQ(stateOf(a.user), userA);
   EXPECT_EQ(stateOf(b.user), userB);
@@ -282,7 +284,9 @@ TEST_P(Pull, MirrorsTheOrigin) {
   if (row.outcome == Outcome::NoOrigin) {
     std::future<void> stray;
     EXPECT_TRUE(raises([&] { stray = puller->pull(); }, kiv::messages::NoOrigin()));
-    if (stray.valid()) ASSERT_TRUE(finishes(stray));
+    if (stray.valid()) {
+      ASSERT_TRUE(finishes(stray));
+    }
     EXPECT_EQ(dumpOf(repositories), before);
     return;
   }
@@ -357,7 +361,7 @@ TEST_F(Follow, ObservingClonesPullWhenAnotherClonePushes) {
   for (Clone* clone : {&a, &b, &queued}) clone->repository->startObservingOrigin();
   Clone idle = cloneOrigin();
 
-  for (const std::u16string& node : {u"x", u"y"}) {
+  for (const std::u16string node : {u"x", u"y"}) {
     publish(a, node);
     ASSERT_FALSE(HasFatalFailure());
     EXPECT_TRUE(b.repository->isEquivalent(origin)) << "pulled before the push ended";

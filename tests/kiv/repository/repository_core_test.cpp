@@ -56,7 +56,9 @@ TEST_P(BranchMap, AddsAndRemovesByName) {
       repository->remove(step.name);
       EXPECT_TRUE(held.isLive()) << "a removed branch leaves the map, it is not destroyed";
     }
-    if (step.fails) EXPECT_EQ(dumpOf(repositories), before) << "a refused step changes nothing";
+    if (step.fails) {
+      EXPECT_EQ(dumpOf(repositories), before) << "a refused step changes nothing";
+    }
     EXPECT_EQ(repository->canCheckout(step.name), step.kind == MapStep::Add);
   }
   EXPECT_EQ(branchNames(repository), row.after);

@@ -96,8 +96,11 @@ class StateRecorder : public qf::zero::Listener {
   StateRecorder& operator=(const StateRecorder&) = delete;
 
   void transactionCommitted(const std::shared_ptr<Report>& /*report*/) {
-    if (recording) states_[clone_.tip()] = stateOf(clone_.user);
+    if (recording) record();
   }
+
+  // For commits that leave the user model as it is (a snapshot).
+  void record() { states_[clone_.tip()] = stateOf(clone_.user); }
 
   const std::unordered_map<kiv::Commit, State>& states() const { return states_; }
   const State& at(const kiv::Commit& commit) const { return states_.at(commit); }

@@ -1,5 +1,7 @@
 // Properties of the workspace on seeded random edit sequences: every state a user model
 // had at a commit comes back through undo, redo, checkout and setContext.
+#include "kiv/merge/property_merge_tool.h"
+#include "kiv/merge/recursive_merge3_strategy.h"
 #include "kiv/workspace/workspace_fixture.h"
 #include "support/random_editor.h"
 
@@ -9,8 +11,9 @@
 namespace workspace_test {
 namespace {
 
-// Random edits on "master", then on "side" branched from it, then on "master" again; each
-// committed user transaction is a commit whose state the recorder keeps.
+// Random edits on "master", then on "side" branched from it, then on "master" again with a
+// snapshot and a merge of "side" among them; the recorder keeps the state of each commit.
+// Whole-state commits must read as states, not as changes from nothing, in both directions.
 class WorkspaceProperties : public ::testing::TestWithParam<unsigned>, public RepositoryModels {
  protected:
   void SetUp() override {
@@ -26,7 +29,18 @@ class WorkspaceProperties : public ::testing::TestWithParam<unsigned>, public Re
     clone.workspace->branch(u"side");
     ASSERT_NO_FATAL_FAILURE(edit(10));
     clone.workspace->checkout(u"master");
-    ASSERT_NO_FATAL_FAILURE(edit(8));
+    ASSERT_NO_FATAL_FAILURE(edit(3));
+    clone.workspace->takeSnapshot();
+    recorder.record();
+    ASSERT_NO_FATAL_FAILURE(edit(3));
+    // The property tool, because it leaves no two ends of a reference disagreeing: the
+    // state it records is the one the user model takes.
+    installStrategy(clone.repository, std::make_shared<kiv::RecursiveMerge3Strategy>(
+                                          std::make_unique<kiv::PropertyMergeTool>()));
+    clone.workspace->merge(u"side");
+    ASSERT_TRUE(clone.tip()->isMerge());
+    recorder.record();
+    ASSERT_NO_FATAL_FAILURE(edit(2));
     recorder.recording = false;
     ASSERT_GE(recorder.states().size(), 12u) << "too few edits became commits";
   }
