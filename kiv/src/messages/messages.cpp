@@ -20,6 +20,7 @@ constexpr CatalogEntry entries[] = {
     {"CannotRedo", "There is nothing to redo."},
     {"CannotUndo", "There is nothing to undo."},
     {"HeadDelete", "Cannot delete the branch that is checked out."},
+    {"MalformedHistory", "The history is malformed: {1}."},
     {"ModelsIdentical", "The user model and the repository model must be two different models."},
     {"ModelsSwapped",
      "The models are given the wrong way round: pass the user model first and the repository model second."},

@@ -1,48 +1,227 @@
+#include "kiv/messages/messages.h"
+#include "kiv/metamodel/branch_impl.h"
+#include "kiv/metamodel/commit_impl.h"
+#include "kiv/metamodel/delta_impl.h"
 #include "kiv/metamodel/protocol/history_impl.h"
+#include "kiv/protocol/aggregate_customizer.h"
+#include "kiv/protocol/terminator_model_builder.h"
+#include "protocol/history_checks.h"
 #include "qf/zero/core/messages.h"
+#include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/report_exception.h"
+#include "qf/zero/core/transaction.h"
+#include "qf/zero/io/json_parser.h"
+#include "qf/zero/io/json_serializer.h"
+#include "qf/zero/io/parse_customizer.h"
 
 #include <nlohmann/json.hpp>
 
+#include <algorithm>
+#include <map>
+#include <unordered_set>
+
 namespace kiv::protocol {
 
-::kiv::protocol::History History::Impl::parseHistory(const qf::zero::JsonValue& /*historyJson*/,
-                                                     const qf::zero::Model& /*model*/,
-                                                     const std::vector<std::u16string>& /*properties*/,
-                                                     const qf::zero::Model& /*otherModel*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.protocol.History.parseHistory"));
+namespace {
+
+using qf::zero::ModelElement;
+
+bool isPresent(const ModelElement& element) { return element && element.isLive(); }
+
+qf::zero::Transaction beginOn(const ModelElement::Impl& element) {
+  if (element.isProxy()) qf::zero::reportException(qf0::messages::CannotModifyProxy());
+  if (!element.isLive()) qf::zero::reportException(qf0::messages::CannotModifyDestroyedElement());
+  return element.getModelImpl()->beginTransaction();
+}
+
+// What a received history's entries are read as. The History entry reads only the named
+// sets; the other entries are read only when a named set holds their class; an entry
+// that the target model already holds is not read again: recorded history is immutable,
+// and references to it resolve to the element that is there.
+class HistoryParseCustomizer : public qf::zero::io::ParseCustomizer {
+ public:
+  HistoryParseCustomizer(qf::zero::Model model, const std::vector<std::u16string>& properties)
+      : model_(std::move(model)), properties_(properties.begin(), properties.end()) {}
+
+  bool shallInstantiate(const qf::zero::meta::Class& type, const qf::zero::io::ElementId& id) override {
+    const MetaPackageKiv& kiv = MetaPackageKiv::getInstance();
+    if (type == History::metaClass()) {
+      if (++histories_ > 1)
+        qf::zero::reportException(messages::MalformedHistory("more than one history entry"));
+      return true;
+    }
+    bool wanted = false;
+    if (type == Branch::metaClass()) {
+      wanted = reads(kiv.getHistory_previous()) || reads(kiv.getHistory_current());
+    } else if (type == Commit::metaClass()) {
+      wanted = reads(kiv.getHistory_commits());
+    } else if (type == Delta::metaClass()) {
+      wanted = reads(kiv.getHistory_deltas());
+    } else if (type == ObjectStorage::metaClass()) {
+      wanted = reads(kiv.getHistory_objectStorages());
+    } else {
+      qf::zero::reportException(
+          messages::MalformedHistory("an entry of class " + qf::zero::toUtf8(type.getQualifiedName())));
+    }
+    if (!wanted || !id.uuid || id.uuid->is_nil()) return false;
+    const ModelElement held = model_->findElement(*id.uuid, qf::zero::FindElementBehavior::IncludeProxies);
+    if (!held) return true;
+    if (held.isProxy() || !held.getMetaClass()->isSubclassOf(type)) {
+      qf::zero::reportException(qf0::messages::DuplicateElementId(qf::zero::toText(*id.uuid)));
+    }
+    return false;
+  }
+
+  bool shallReadProperty(const ModelElement& element, const qf::zero::meta::Property& property) override {
+    if (element.getMetaClass() == History::metaClass()) return reads(property);
+    // Which repository a branch belongs to is the receiver's business.
+    return property != MetaPackageKiv::getInstance().getBranch_repository();
+  }
+
+ private:
+  bool reads(const qf::zero::meta::Property& property) const {
+    return properties_.count(std::u16string(property.getName())) != 0;
+  }
+
+  qf::zero::Model model_;
+  std::unordered_set<std::u16string> properties_;
+  int histories_ = 0;
+};
+
+template <class Element>
+std::vector<Element> sortedByUuid(std::vector<Element> elements) {
+  std::sort(elements.begin(), elements.end(),
+            [](const Element& a, const Element& b) { return a.getUuid() < b.getUuid(); });
+  return elements;
+}
+
+// The branches of a set as a map by name, as branch maps are compared.
+template <class Set>
+std::map<std::u16string, Branch> byName(const Set& branches) {
+  std::map<std::u16string, Branch> result;
+  for (const Branch& branch : branches.container()) {
+    if (isPresent(branch)) result.emplace(branch->getName(), branch);
+  }
+  return result;
+}
+
+}  // namespace
+
+// The commits between the two branch states. A branch state is its tip and its redo
+// stack: the receiver takes both over, so the commits of the redo stack travel too.
+void History::Impl::resolveCommits() {
+  std::unordered_set<Commit> before;
+  std::unordered_set<Commit> after;
+  for (const Branch& branch : previous_.container()) {
+    if (isPresent(branch) && isPresent(branch->getTip())) before.insert(branch->getTip());
+  }
+  for (const Branch& branch : current_.container()) {
+    if (!isPresent(branch)) continue;
+    if (isPresent(branch->getTip())) after.insert(branch->getTip());
+    for (const Commit& undone : branch->getRedoStack().container()) {
+      if (isPresent(undone)) after.insert(undone);
+    }
+  }
+  std::unordered_set<Commit> between;
+  Commit::Impl::selectInRange(before, after, between);
+  qf::zero::Transaction transaction = beginOn(*this);
+  getCommitsMutable().clear();
+  for (const Commit& commit : sortedByUuid(std::vector<Commit>(between.begin(), between.end()))) {
+    getCommitsMutable().add(commit);
+  }
+  transaction.commit();
 }
 
 qf::zero::JsonValue History::Impl::pack() {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.protocol.History.pack"));
-}
-
-void History::Impl::resolveCommits() {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.protocol.History.resolveCommits"));
-}
-
-::kiv::protocol::History History::Impl::unpack(const qf::zero::JsonValue& /*historyJson*/,
-                                               const qf::zero::Model& /*model*/,
-                                               const qf::zero::Model& /*otherModel*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.protocol.History.unpack"));
-}
-
-::kiv::protocol::History History::Impl::unpackBranches(const qf::zero::JsonValue& /*historyJson*/,
-                                                       const qf::zero::Model& /*model*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.protocol.History.unpackBranches"));
-}
-
-::kiv::protocol::History History::Impl::unpackNonBranches(const qf::zero::JsonValue& /*historyJson*/,
-                                                          const qf::zero::Model& /*model*/) {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.protocol.History.unpackNonBranches"));
-}
-
-bool History::Impl::isEquivalent(const ::kiv::protocol::History& /*history*/) const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.protocol.History.isEquivalent"));
+  resolveCommits();
+  qf::zero::Transaction transaction = beginOn(*this);
+  getObjectStoragesMutable().clear();
+  getDeltasMutable().clear();
+  std::unordered_set<Delta> deltas;
+  std::unordered_set<ObjectStorage> storages;
+  for (const Commit& commit : commits_.container()) {
+    const Delta delta = isPresent(commit) ? commit->getDelta() : Delta();
+    if (!isPresent(delta) || !deltas.insert(delta).second) continue;
+    getDeltasMutable().add(delta);
+    for (const auto* side : {&delta->getPrevious().container(), &delta->getCurrent().container()}) {
+      for (const auto& [uuid, storage] : *side) {
+        if (isPresent(storage) && storages.insert(storage).second) getObjectStoragesMutable().add(storage);
+      }
+    }
+  }
+  transaction.commit();
+  qf::zero::io::JSONSerializer serializer(std::make_unique<qf::zero::io::JSONModelTraverser>(),
+                                          std::make_unique<AggregateCustomizer>());
+  qf::zero::JsonValue document;
+  serializer.serialize(ModelElement(this),
+                       qf::zero::io::SerializationOutput::forIntermediateFormat(&document));
+  return document;
 }
 
 void History::Impl::clear() {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.protocol.History.clear"));
+  qf::zero::Transaction transaction = beginOn(*this);
+  getObjectStoragesMutable().clear();
+  getDeltasMutable().clear();
+  getCommitsMutable().clear();
+  getCurrentMutable().clear();
+  getPreviousMutable().clear();
+  transaction.commit();
+}
+
+bool History::Impl::isEquivalent(const History& other) const {
+  if (!isPresent(other)) return false;
+  const auto identities = [](const DeltasCollection& deltas) {
+    std::unordered_set<qf::zero::Uuid, boost::hash<qf::zero::Uuid>> result;
+    for (const ModelElement& delta : deltas.getAllValuesAndProxies()) {
+      result.insert(delta.isProxy() ? delta->getProxyId().elementId : delta.getUuid());
+    }
+    return result;
+  };
+  if (identities(deltas_) != identities(other->getDeltas())) return false;
+  return Branch::Impl::areBranchMapsEquivalent(byName(previous_), byName(other->getPrevious())) &&
+         Branch::Impl::areBranchMapsEquivalent(byName(current_), byName(other->getCurrent()));
+}
+
+History History::Impl::parseHistory(const qf::zero::JsonValue& historyJson, const qf::zero::Model& model,
+                                    const std::vector<std::u16string>& properties,
+                                    const qf::zero::Model& otherModel) {
+  if (!model) qf::zero::reportException(qf0::messages::CannotCreateWithoutModel());
+  qf::zero::io::JSONParser parser(std::make_unique<HistoryParseCustomizer>(model, properties),
+                                  std::make_unique<TerminatorModelBuilder>(otherModel));
+  qf::zero::Transaction transaction = model->beginTransaction();
+  History history;
+  for (const qf::zero::io::ParseItem& item : parser.parseVerbatim(historyJson, model)) {
+    const ModelElement element = item.getValue().getElement();
+    if (element && element.getMetaClass() == History::metaClass()) {
+      history = qf::zero::elementCast<History>(element);
+      break;
+    }
+  }
+  if (!history) qf::zero::reportException(messages::MalformedHistory("no history entry"));
+  checkReceivedHistory(history);
+  transaction.commit();
+  return history;
+}
+
+History History::Impl::unpack(const qf::zero::JsonValue& historyJson, const qf::zero::Model& model,
+                              const qf::zero::Model& otherModel) {
+  return parseHistory(historyJson, model, {u"previous", u"current", u"commits", u"deltas", u"objectStorages"},
+                      otherModel);
+}
+
+History History::Impl::unpackBranches(const qf::zero::JsonValue& historyJson, const qf::zero::Model& model) {
+  return parseHistory(historyJson, model, {u"previous", u"current"}, qf::zero::Model());
+}
+
+// References must resolve in the target model itself: a commit, delta or storage that is
+// neither carried nor already there makes the history dangle.
+History History::Impl::unpackNonBranches(const qf::zero::JsonValue& historyJson,
+                                         const qf::zero::Model& model) {
+  if (!model) qf::zero::reportException(qf0::messages::CannotCreateWithoutModel());
+  qf::zero::Transaction transaction = model->beginTransaction();
+  History history = parseHistory(historyJson, model, {u"commits", u"deltas", u"objectStorages"}, model);
+  transaction.commit();
+  return history;
 }
 
 }  // namespace kiv::protocol

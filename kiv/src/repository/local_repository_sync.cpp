@@ -3,12 +3,14 @@
 #include "kiv/messages/messages.h"
 #include "kiv/metamodel/branch_impl.h"
 #include "kiv/metamodel/local_repository_impl.h"
+#include "kiv/repository/packet_answers.h"
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/report_exception.h"
 #include "qf/zero/core/transaction.h"
 #include "qf/zero/io/packet_transport.h"
 #include "repository/history_branches.h"
+#include "repository/remote_exchange.h"
 
 #include <nlohmann/json.hpp>
 
@@ -54,7 +56,15 @@ protocol::History describePush(LocalRepository::Impl& repository, const Reposito
 // The origin takes the pushed branches over only if it is still in the state the history
 // was made against. In process, the pushing repository itself holds the branches the
 // history's current set names.
+// A remote origin takes the history over the network; its proxy then mirrors what the
+// remote took over.
 void deliverPush(const LocalRepository& self, const Repository& origin, const protocol::History& history) {
+  if (const RemoteRepository remote = asRemote(origin)) {
+    remote.pushObjects(history);
+    const std::unique_lock<std::mutex> lock = lockExchanges(remote);
+    origin->syncBranches(self);
+    return;
+  }
   if (!origin->canPush(history)) qf::zero::reportException(messages::CannotPush());
   origin->syncBranches(self);
 }
@@ -79,6 +89,9 @@ std::future<void> LocalRepository::Impl::push(PushMode mode) {
   if (const Branch head = origin->getHead(); isPresent(head) && !canCheckout(head->getName())) {
     qf::zero::reportException(messages::HeadDelete());
   }
+  // The proxy of a remote origin is brought up to date first, so that "TryPush" refuses
+  // and "MergeFirst" merges against the remote's present state, as with a local origin.
+  if (const RemoteRepository remote = asRemote(origin)) remote.pullObjects();
   protocol::History history;
   {
     qf::zero::Transaction transaction = getModelImpl()->beginTransaction();
@@ -100,41 +113,41 @@ std::future<void> LocalRepository::Impl::push(PushMode mode) {
 std::future<void> LocalRepository::Impl::pull() {
   const Repository origin = liveOrigin(*this);
   const LocalRepository self(this);
-  return std::async(std::launch::async, [self, origin] { self->syncBranches(origin); });
+  return std::async(std::launch::async, [self, origin] {
+    if (const RemoteRepository remote = asRemote(origin)) {
+      remote.pullObjects();
+      const std::unique_lock<std::mutex> lock = lockExchanges(remote);
+      self->syncBranches(origin);
+      return;
+    }
+    self->syncBranches(origin);
+  });
 }
 
-// Remote peers register as observers through packets; the count decides whether change
-// notices go out on the transport.
+// The handlers of a served repository. Each runs on the transport's worker thread, one
+// packet at a time, so the repository model is never used by two of them at once; a
+// handler that raises is answered "Error" by the transport, after its transaction rolled
+// everything back.
 void LocalRepository::Impl::setOnReceive() {
   const std::shared_ptr<qf::zero::io::PacketTransport>& transport = getPacketTransport();
   if (!transport) return;
   const LocalRepository self(this);
-  const auto ok = [] { return qf::zero::io::JSONPacket(toString(protocol::PacketType::OK), nullptr); };
-  transport->setPacketHandler(
-      toString(protocol::PacketType::AddRemoteObserver),
-      [self, ok](const qf::zero::io::JSONPacket&) -> boost::optional<qf::zero::io::JSONPacket> {
-        {
-          qf::zero::Transaction transaction = self.getModel()->beginTransaction();
-          self->setNumRemoteObservers(self->getNumRemoteObservers() + 1);
-          transaction.commit();
-        }
-        if (!self->getRepositoryListener()) self->addRepositoryListener();
-        return ok();
-      },
-      qf::zero::io::PacketPromiseMode::OnWorkerThread);
-  transport->setPacketHandler(
-      toString(protocol::PacketType::RemoveRemoteObserver),
-      [self, ok](const qf::zero::io::JSONPacket&) -> boost::optional<qf::zero::io::JSONPacket> {
-        {
-          qf::zero::Transaction transaction = self.getModel()->beginTransaction();
-          if (self->getNumRemoteObservers() > 0)
-            self->setNumRemoteObservers(self->getNumRemoteObservers() - 1);
-          transaction.commit();
-        }
-        self->removeRepositoryListener();
-        return ok();
-      },
-      qf::zero::io::PacketPromiseMode::OnWorkerThread);
+  using protocol::PacketType;
+  const auto on = [&](PacketType type,
+                      std::function<qf::zero::io::JSONPacket(const qf::zero::io::JSONPacket&)> answer) {
+    transport->setPacketHandler(
+        toString(type),
+        [answer = std::move(answer)](const qf::zero::io::JSONPacket& request)
+            -> boost::optional<qf::zero::io::JSONPacket> { return answer(request); },
+        qf::zero::io::PacketPromiseMode::OnWorkerThread);
+  };
+  on(PacketType::PullInfo, [self](const qf::zero::io::JSONPacket&) { return answerPullInfo(self); });
+  on(PacketType::Pull, [self](const qf::zero::io::JSONPacket& request) { return answerPull(self, request); });
+  on(PacketType::Push, [self](const qf::zero::io::JSONPacket& request) { return answerPush(self, request); });
+  on(PacketType::AddRemoteObserver,
+     [self](const qf::zero::io::JSONPacket&) { return answerObserver(self, true); });
+  on(PacketType::RemoveRemoteObserver,
+     [self](const qf::zero::io::JSONPacket&) { return answerObserver(self, false); });
 }
 
 }  // namespace kiv

@@ -270,8 +270,29 @@ void Repository::Impl::setSynchronizationChannel(
   setOnReceive();
 }
 
-Repository Repository::Impl::unpackHistory(const qf::zero::JsonValue& /*historyJson*/) const {
-  qf::zero::reportException(qf0::messages::NotImplemented(u"kiv.Repository.unpackHistory"));
+// The scratch repository and the history's branches live in a model of their own, which
+// this repository keeps alive until the next call. The commits, deltas and storages its branches need
+// land in this repository's model (what it holds already is kept as it is), in one
+// transaction: a savepoint of the caller's when one is open, so that a caller that then
+// refuses the history leaves nothing behind.
+Repository Repository::Impl::unpackHistory(const qf::zero::JsonValue& historyJson) const {
+  const qf::zero::Model scratchModel = qf::zero::Model::create();
+  lastUnpackedModel_ = scratchModel;
+  const protocol::History history = protocol::History::unpack(historyJson, scratchModel, getModel());
+  LocalRepository scratch;
+  {
+    qf::zero::Transaction transaction = scratchModel->beginTransaction();
+    scratch = LocalRepository::create(scratchModel);
+    for (const Branch& branch : repository::branchesOf(history, false)) {
+      if (isPresent(branch)) scratch->add(branch);
+    }
+    transaction.commit();
+  }
+  qf::zero::Transaction transaction = beginOn(*this);
+  protocol::History carried = protocol::History::unpackNonBranches(historyJson, getModel());
+  carried.destroy();
+  transaction.commit();
+  return scratch;
 }
 
 std::string Repository::Impl::toString(protocol::PacketType type) {
@@ -295,6 +316,7 @@ std::string Repository::Impl::serializeAggregate(const qf::zero::ModelElement& e
 }
 
 void Repository::Impl::invalidate() {
+  lastUnpackedModel_ = qf::zero::Model();
   basicSetRepositoryListener(nullptr);
   basicSetPacketTransport(nullptr);
   RepositoryObserver::Impl::invalidate();

@@ -26,6 +26,7 @@ TEST(KivMessages, EveryKeyHasATextAndAClassWhoseArgumentsFillItsPlaceholders) {
       messageRow<msg::CannotRedo>(),
       messageRow<msg::CannotUndo>(),
       messageRow<msg::HeadDelete>(),
+      messageRow<msg::MalformedHistory>("cyclic parents"),
       messageRow<msg::ModelsIdentical>(),
       messageRow<msg::ModelsSwapped>(),
       messageRow<msg::NoOrigin>(),

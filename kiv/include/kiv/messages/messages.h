@@ -22,6 +22,7 @@ FOUNDATION_MESSAGE(catalog, CannotPush)
 FOUNDATION_MESSAGE(catalog, CannotRedo)
 FOUNDATION_MESSAGE(catalog, CannotUndo)
 FOUNDATION_MESSAGE(catalog, HeadDelete)
+FOUNDATION_MESSAGE(catalog, MalformedHistory, std::string)  // what is wrong, e.g. "cyclic parents"
 FOUNDATION_MESSAGE(catalog, ModelsIdentical)
 FOUNDATION_MESSAGE(catalog, ModelsSwapped)
 FOUNDATION_MESSAGE(catalog, NoOrigin)
