@@ -157,6 +157,85 @@ TEST_F(OverTheNetwork, AnObserverIsToldOfAnotherClientsPushAndPullsWhenItChooses
   EXPECT_EQ(served->getNumRemoteObservers(), 0);
 }
 
+// Four clients on their own threads edit, push with "MergeFirst" and pull in turns of
+// their own choosing; a push that loses a race to another is refused and tried again.
+TEST_F(OverTheNetwork, FourClientsConvergeOnOneServer) {
+  constexpr int clients = 4;
+  constexpr int rounds = 6;
+  std::vector<RemoteClone> clones;
+  for (int i = 0; i < clients; ++i) clones.push_back(cloneServed());
+  std::vector<std::future<void>> workers;
+  for (int i = 0; i < clients; ++i) {
+    workers.push_back(std::async(std::launch::async, [this, &clone = clones[i], i] {
+      for (int round = 0; round < rounds; ++round) {
+        addNode(clone, u"client " + qf::zero::toUtf16(std::to_string(i)) + u" round " +
+                           qf::zero::toUtf16(std::to_string(round)));
+        bool pushed = false;
+        for (int attempt = 0; attempt < 50 && !pushed; ++attempt) {
+          std::future<void> push = clone.workspace->push(kiv::PushMode::MergeFirst);
+          if (!finishes(push)) throw std::runtime_error("a push hangs");
+          try {
+            push.get();
+            pushed = true;
+          } catch (const Exception<kiv::messages::CannotPush>&) {
+            // another client pushed between this one's look at the server and its push
+          }
+          clone.workspace->updateContext();
+        }
+        if (!pushed) throw std::runtime_error("a push never got through");
+        std::future<void> pull = clone.workspace->pull();
+        if (!finishes(pull)) throw std::runtime_error("a pull hangs");
+        pull.get();
+      }
+    }));
+  }
+  for (std::future<void>& worker : workers) {
+    ASSERT_TRUE(finishes(worker));
+    worker.get();
+  }
+  for (RemoteClone& clone : clones) ASSERT_TRUE(completes(clone.workspace->pull()));
+  for (RemoteClone& clone : clones) {
+    EXPECT_TRUE(clone.repository->isEquivalent(served));
+    EXPECT_EQ(stateOf(clone.user), stateOf(clones.front().user));
+  }
+  EXPECT_EQ(stateOf(clones.front().user).size(), static_cast<std::size_t>(clients * rounds));
+}
+
+// Without a server: the served repository answers on its own transport, the one peer
+// at its other end, and tells it of changes while it observes.
+TEST_F(OverTheNetwork, ALocalRepositoryServesThePeerOnItsOwnTransport) {
+  const Model ownModel = Model::create();
+  const Model ownUser = Model::create();
+  const kiv::LocalRepository alone = kiv::LocalRepository::create(ownModel, ownUser);
+  alone->init(kiv::RepoType::Bare);
+  auto [mine, theirs] = InProcessChannel::createPair();
+  alone->setSynchronizationChannel(theirs);
+
+  RemoteClone peer;
+  {
+    qf::zero::Transaction transaction = peer.repositories->beginTransaction();
+    peer.origin = kiv::RemoteRepository::create(peer.repositories);
+    transaction.commit();
+  }
+  peer.origin->setSynchronizationChannel(mine);
+  peer.repository = peer.origin->synchronousClone(kiv::RepoType::Regular);
+  peer.workspace = peer.repository->getWorkspace(peer.user);
+  auto notices = std::make_shared<kiv::QueuedNoticeExecutor>();
+  kiv::setNoticeExecutor(peer.repository, notices);
+  peer.repository->startObservingOrigin();
+  EXPECT_EQ(alone->getNumRemoteObservers(), 1);
+
+  addNode(peer, u"p");
+  ASSERT_TRUE(completes(peer.workspace->push(kiv::PushMode::TryPush)));
+  EXPECT_EQ(alone->getHead()->getTip().getUuid(), peer.tip().getUuid());
+  ASSERT_TRUE(notices->waitForWork(std::chrono::seconds(30))) << "the change was not told";
+  notices->runPending();
+  EXPECT_TRUE(peer.repository->isEquivalent(alone));
+
+  peer.repository->stopObservingOrigin();
+  EXPECT_EQ(alone->getNumRemoteObservers(), 0);
+}
+
 // A peer that speaks the protocol badly: every request is answered, nothing changes,
 // and the server goes on serving others.
 struct HostileRequest {
