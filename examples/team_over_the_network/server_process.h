@@ -1,0 +1,34 @@
+// A kiv-serve started as a child process on a free loopback port, stopped with SIGTERM
+// when the handle goes.
+#pragma once
+
+#include <sys/types.h>
+
+#include <cstdint>
+#include <string>
+
+namespace team_over_the_network {
+
+class ServerProcess {
+ public:
+  // Starts `program --port 0` and waits (at most ten seconds) for the line that names the
+  // port it listens on. Raises std::runtime_error when it cannot be started or says nothing.
+  explicit ServerProcess(const std::string& program);
+  ~ServerProcess();
+  ServerProcess(const ServerProcess&) = delete;
+  ServerProcess& operator=(const ServerProcess&) = delete;
+
+  std::uint16_t port() const { return port_; }
+  // What the server printed when it began listening.
+  const std::string& greeting() const { return greeting_; }
+
+ private:
+  void stop() noexcept;
+
+  pid_t pid_ = -1;
+  int output_ = -1;
+  std::uint16_t port_ = 0;
+  std::string greeting_;
+};
+
+}  // namespace team_over_the_network
