@@ -7,6 +7,7 @@
 #include "kiv/repository/repository_fixture.h"
 #include "qf/zero/io/in_process_channel.h"
 #include "qf/zero/io/packet_transport.h"
+#include "qf/zero/io/websocket_channel.h"
 
 #include <functional>
 
@@ -45,14 +46,25 @@ class OverTheNetwork : public ::testing::Test {
     return mine;
   }
 
-  RemoteClone cloneServed() {
+  // A WebSocket connection to the server over loopback, through a listener made on first use.
+  std::shared_ptr<qf::zero::io::SynchronizationChannel> connectOverLoopback() {
+    if (!listener) {
+      listener = std::make_unique<qf::zero::io::WebSocketListener>(
+          "127.0.0.1", 0, [this](std::shared_ptr<qf::zero::io::SynchronizationChannel> channel) {
+            server->addConnection(std::move(channel));
+          });
+    }
+    return qf::zero::io::WebSocketChannel::connect("127.0.0.1", listener->getPort());
+  }
+
+  RemoteClone cloneServed(bool overLoopback = false) {
     RemoteClone clone;
     {
       qf::zero::Transaction transaction = clone.repositories->beginTransaction();
       clone.origin = kiv::RemoteRepository::create(clone.repositories);
       transaction.commit();
     }
-    clone.origin->setSynchronizationChannel(connectToServer());
+    clone.origin->setSynchronizationChannel(overLoopback ? connectOverLoopback() : connectToServer());
     clone.repository = clone.origin->synchronousClone(kiv::RepoType::Regular);
     clone.workspace = clone.repository->getWorkspace(clone.user);
     kiv::loadContext(clone.workspace);
@@ -76,6 +88,7 @@ class OverTheNetwork : public ::testing::Test {
   Model serverUser = Model::create();
   kiv::LocalRepository served;
   std::unique_ptr<RepositoryServer> server;
+  std::unique_ptr<qf::zero::io::WebSocketListener> listener;  // closed before the server goes
 };
 
 TEST_F(OverTheNetwork, ClientsCloneEditPushMergeAndPullUntilTheyAgree) {
@@ -157,13 +170,14 @@ TEST_F(OverTheNetwork, AnObserverIsToldOfAnotherClientsPushAndPullsWhenItChooses
   EXPECT_EQ(served->getNumRemoteObservers(), 0);
 }
 
-// Four clients on their own threads edit, push with "MergeFirst" and pull in turns of
-// their own choosing; a push that loses a race to another is refused and tried again.
+// Four clients on their own threads, over WebSocket on loopback, edit, push with
+// "MergeFirst" and pull in turns of their own choosing; a push that loses a race to
+// another is refused and tried again.
 TEST_F(OverTheNetwork, FourClientsConvergeOnOneServer) {
   constexpr int clients = 4;
   constexpr int rounds = 6;
   std::vector<RemoteClone> clones;
-  for (int i = 0; i < clients; ++i) clones.push_back(cloneServed());
+  for (int i = 0; i < clients; ++i) clones.push_back(cloneServed(true));
   std::vector<std::future<void>> workers;
   for (int i = 0; i < clients; ++i) {
     workers.push_back(std::async(std::launch::async, [this, &clone = clones[i], i] {
@@ -235,6 +249,61 @@ TEST_F(OverTheNetwork, ALocalRepositoryServesThePeerOnItsOwnTransport) {
   peer.repository->stopObservingOrigin();
   EXPECT_EQ(alone->getNumRemoteObservers(), 0);
 }
+
+// A server that answers badly: the client gets a clear error and its repository model is
+// as it was.
+struct BadReply {
+  std::string name;
+  std::string request;  // the request type the fake server answers badly
+  JSONPacket reply;
+  std::function<void(const kiv::RemoteRepository&)> ask;
+  std::string raisedKey;  // the key of the catalog error the client raises
+};
+
+class BadServer : public ::testing::TestWithParam<BadReply> {};
+
+TEST_P(BadServer, ClientRaisesAndKeepsItsModel) {
+  const BadReply& row = GetParam();
+  kiv::MetaPackageKiv::getInstance();
+  auto [mine, theirs] = InProcessChannel::createPair();
+  PacketTransport fake(theirs);
+  fake.setPacketHandler(row.request,
+                        [&](const JSONPacket&) -> boost::optional<JSONPacket> { return row.reply; });
+  const Model repositories = Model::create();
+  kiv::RemoteRepository remote;
+  {
+    qf::zero::Transaction transaction = repositories->beginTransaction();
+    remote = kiv::RemoteRepository::create(repositories);
+    transaction.commit();
+  }
+  remote->setSynchronizationChannel(mine);
+  const std::string before = dumpOf(repositories);
+  try {
+    row.ask(remote);
+    ADD_FAILURE() << "raised nothing";
+  } catch (const foundation::core::except::ExceptionBase& raised) {
+    EXPECT_EQ(raised.GetBaseMsgIDObj().key(), row.raisedKey) << raised.message();
+  }
+  EXPECT_EQ(dumpOf(repositories), before);
+}
+
+const auto pullInfo = [](const kiv::RemoteRepository& remote) { remote->pullRepoInfo(); };
+const auto pullObjects = [](const kiv::RemoteRepository& remote) { remote->pullObjects(); };
+const std::vector<BadReply> badReplies = {
+    {"RepoInfoWithoutHead", "PullInfo", JSONPacket("RepoInfo", {{"isBare", true}}), pullInfo,
+     "MalformedPacket"},
+    {"RepoInfoOfWrongTypes", "PullInfo", JSONPacket("RepoInfo", {{"isBare", "yes"}, {"head", 1}}), pullInfo,
+     "MalformedPacket"},
+    {"AnotherReplyType", "PullInfo", JSONPacket("History", nullptr), pullInfo, "UnexpectedPacket"},
+    {"AnError", "Pull", JSONPacket("Error", {{"message", "no"}}), pullObjects, "UnexpectedPacket"},
+    {"HistoryNotADocument", "Pull", JSONPacket("History", "nonsense"), pullObjects, "MalformedDocument"},
+    {"HistoryWithoutAHistory", "Pull",
+     JSONPacket("History", {{"version", "1.0"}, {"entries", JsonValue::array()}}), pullObjects,
+     "MalformedHistory"},
+};
+
+using repository_test::PrintTo;
+INSTANTIATE_TEST_SUITE_P(Replies, BadServer, ::testing::ValuesIn(badReplies), CaseName());
 
 // A peer that speaks the protocol badly: every request is answered, nothing changes,
 // and the server goes on serving others.
