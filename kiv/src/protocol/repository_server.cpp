@@ -5,6 +5,7 @@
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/report_exception.h"
 #include "qf/zero/io/packet_transport.h"
+#include "repository/start_later_channel.h"
 
 #include <nlohmann/json.hpp>
 
@@ -101,7 +102,9 @@ RepositoryServer::RepositoryServer(LocalRepository served) {
 RepositoryServer::~RepositoryServer() { close(); }
 
 void RepositoryServer::addConnection(std::shared_ptr<qf::zero::io::SynchronizationChannel> channel) {
-  auto transport = std::make_shared<PacketTransport>(std::move(channel));
+  if (!channel) qf::zero::reportException(qf0::messages::CannotCreateTransportWithoutChannel());
+  auto held = std::make_shared<StartLaterChannel>(std::move(channel));
+  auto transport = std::make_shared<PacketTransport>(held);
   std::size_t id = 0;
   {
     const std::lock_guard<std::mutex> lock(state_->connectionsMutex);
@@ -135,6 +138,7 @@ void RepositoryServer::addConnection(std::shared_ptr<qf::zero::io::Synchronizati
      [id](State& state, const JSONPacket&) { return state.observe(id, true); });
   on(PacketType::RemoveRemoteObserver,
      [id](State& state, const JSONPacket&) { return state.observe(id, false); });
+  held->open();
 }
 
 std::size_t RepositoryServer::connectionCount() const {

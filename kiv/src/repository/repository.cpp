@@ -18,6 +18,7 @@
 #include "qf/zero/io/packet_transport.h"
 #include "qf/zero/io/serialization_output.h"
 #include "repository/history_branches.h"
+#include "repository/start_later_channel.h"
 
 #include <nlohmann/json.hpp>
 
@@ -262,12 +263,23 @@ void Repository::Impl::notifyObservers() {
 
 void Repository::Impl::setSynchronizationChannel(
     const std::shared_ptr<qf::zero::io::SynchronizationChannel>& channel) {
+  // The channel starts once the handlers are in place: a peer's first request must find
+  // its handler.
+  std::shared_ptr<StartLaterChannel> held;
   {
     qf::zero::Transaction transaction = beginOn(*this);
-    setPacketTransport(std::make_shared<qf::zero::io::PacketTransport>(channel));
+    if (!channel) qf::zero::reportException(qf0::messages::CannotCreateTransportWithoutChannel());
+    held = std::make_shared<StartLaterChannel>(channel);
+    setPacketTransport(std::make_shared<qf::zero::io::PacketTransport>(held));
     transaction.commit();
   }
-  setOnReceive();
+  try {
+    setOnReceive();
+  } catch (...) {
+    held->open();
+    throw;
+  }
+  held->open();
 }
 
 // The scratch repository and the history's branches live in a model of their own, which
