@@ -9,10 +9,14 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <cstdint>
+#include <filesystem>
 #include <future>
 #include <memory>
 #include <string>
+#include <thread>
+#include <vector>
 
 namespace support {
 
@@ -171,6 +175,66 @@ TEST(WebSocketListener, PeersThatFailOrStallTheHandshakeAreDroppedUnseen) {
   auto inbox = Inbox::startOn(*server);
   channel->send("still open");
   EXPECT_EQ(inbox->next(), "still open");
+}
+
+std::size_t threadCount() {
+  std::size_t count = 0;
+  for ([[maybe_unused]] const auto& task : std::filesystem::directory_iterator("/proc/self/task")) ++count;
+  return count;
+}
+
+// Each handshake under way holds a thread: a flood of silent peers must not pile them up,
+// and once the flood is gone, peers are served again.
+TEST(WebSocketListener, SilentPeersHoldNoMoreThreadsThanTheHandshakeLimit) {
+  AcceptedChannels accepted;
+  WebSocketListener listener("127.0.0.1", 0, accepted.handler());
+  const std::size_t before = threadCount();
+  {
+    std::vector<std::unique_ptr<RawPeer>> silent;
+    for (int i = 0; i < 200; ++i) silent.push_back(std::make_unique<RawPeer>(listener.getPort()));
+    // The listener takes them one by one; wait (boundedly) until the count stops growing.
+    std::size_t seen = 0;
+    for (int settled = 0, rounds = 0; settled < 5 && rounds < 100; ++rounds) {
+      std::this_thread::sleep_for(std::chrono::milliseconds(50));
+      const std::size_t now = threadCount();
+      settled = now == seen ? settled + 1 : 0;
+      seen = now;
+    }
+    EXPECT_LE(seen, before + WebSocketListener::maxPendingHandshakes + 2);
+  }
+  std::shared_ptr<SynchronizationChannel> client;
+  for (int attempt = 0; attempt < 50 && !client; ++attempt) {
+    try {
+      client = WebSocketChannel::connect("127.0.0.1", listener.getPort());
+    } catch (const ConnectionFailed&) {
+      std::this_thread::sleep_for(std::chrono::milliseconds(100));
+    }
+  }
+  ASSERT_TRUE(client) << "the listener serves nobody after the flood";
+  EXPECT_TRUE(accepted.next());
+}
+
+// What waits to be sent to a peer that reads nothing is bounded: the peer is dropped.
+TEST(WebSocketChannel, APeerThatDoesNotReadIsDroppedBeforeMemoryGrows) {
+  AcceptedChannels accepted;
+  WebSocketListener listener("127.0.0.1", 0, accepted.handler());
+  RawPeer deaf(listener.getPort());
+  ASSERT_EQ(deaf.handshake(), "HTTP/1.1 101 Switching Protocols");
+  auto channel = accepted.next();
+  ASSERT_TRUE(channel);
+  channel->setMaxMessageSize(64 * 1024);
+  auto inbox = Inbox::startOn(*channel);
+  const std::string message(32 * 1024, 'x');
+  bool dropped = false;
+  for (int i = 0; i < 4096 && !dropped; ++i) {  // 128 MiB at most
+    try {
+      channel->send(message);
+    } catch (const Raised<qf0::messages::ChannelClosed>&) {
+      dropped = true;
+    }
+  }
+  EXPECT_TRUE(dropped);
+  EXPECT_THAT(inbox->closedReason().value_or("none"), testing::StartsWith("connection dropped"));
 }
 
 TEST(WebSocketChannel, ATransportAnswersAnOverflowingNumberAndAHandlerThrowingANonExceptionAndCarriesOn) {

@@ -26,8 +26,10 @@
 #include <boost/beast/websocket.hpp>
 
 #include <algorithm>
+#include <atomic>
 #include <chrono>
 #include <deque>
+#include <limits>
 #include <mutex>
 #include <optional>
 #include <utility>
@@ -50,6 +52,8 @@ constexpr auto idleTimeout = std::chrono::seconds(60);
 constexpr auto closeTimeout = std::chrono::seconds(5);
 // Pause before accepting again after accept() failed, e.g. for lack of file descriptors.
 constexpr auto acceptRetryDelay = std::chrono::milliseconds(100);
+// The reason a connection gives when it drops a peer that leaves what it is sent unread.
+constexpr const char* notReadingReason = "connection dropped: the peer does not read what it is sent";
 
 void runUntilStopped(asio::io_context& io) {
   for (;;) {
@@ -154,9 +158,18 @@ class WebSocketConnection : public std::enable_shared_from_this<WebSocketConnect
     asio::post(io_, [this] { doStart(); });
   }
 
-  // Any thread.
+  // Any thread. What waits to be sent is bounded: a peer that leaves it unread is dropped
+  // rather than let memory grow.
   void send(std::string message) {
     state_.checkCanSend(message.size());
+    const std::size_t size = message.size();
+    const std::size_t limit = WebSocketChannel::unsentLimit(state_.maxMessageSize());
+    if (unsent_.fetch_add(size) + size > limit) {
+      unsent_.fetch_sub(size);
+      state_.markClosed(notReadingReason);
+      asio::post(io_, [this] { drop(); });
+      reportException(qf0::messages::ChannelClosed(notReadingReason));
+    }
     asio::post(io_, [this, message = std::move(message)]() mutable { enqueue(std::move(message)); });
   }
 
@@ -248,7 +261,10 @@ class WebSocketConnection : public std::enable_shared_from_this<WebSocketConnect
   }
 
   void enqueue(std::string message) {
-    if (finished_ || closeRequested_) return;
+    if (finished_ || closeRequested_) {
+      unsent_.fetch_sub(message.size());
+      return;
+    }
     outbox_.push_back(std::move(message));
     if (!writing_) writeNext();
   }
@@ -257,6 +273,7 @@ class WebSocketConnection : public std::enable_shared_from_this<WebSocketConnect
     writing_ = true;
     ws_->text(true);
     ws_->async_write(asio::buffer(outbox_.front()), [this](beast::error_code ec, std::size_t) {
+      unsent_.fetch_sub(outbox_.front().size());
       outbox_.pop_front();
       if (ec) {
         writing_ = false;
@@ -288,6 +305,15 @@ class WebSocketConnection : public std::enable_shared_from_this<WebSocketConnect
       shutDown();
     });
     if (!writing_) startClosingHandshake();
+  }
+
+  // Ends the connection at once, without flushing what waits to be sent or a closing
+  // handshake: for a peer that does not read, neither would ever finish.
+  void drop() {
+    if (finished_) return;
+    closeRequested_ = true;
+    closing_ = false;
+    finish(state_.reason());
   }
 
   void startClosingHandshake() {
@@ -347,8 +373,9 @@ class WebSocketConnection : public std::enable_shared_from_this<WebSocketConnect
   asio::steady_timer closeTimer_{io_};
   beast::flat_buffer readBuffer_;
   std::size_t readLimit_ = 0;
-  std::deque<std::string> outbox_;  // front() is being written while writing_
-  std::deque<std::string> held_;    // received before start()
+  std::deque<std::string> outbox_;      // front() is being written while writing_
+  std::atomic<std::size_t> unsent_{0};  // bytes sent by the user and not yet written
+  std::deque<std::string> held_;        // received before start()
   websocket::close_code closeCode_ = websocket::close_code::normal;
 
   bool handshakeDone_ = false;
@@ -469,14 +496,27 @@ class WebSocketListener::Acceptor : public std::enable_shared_from_this<Acceptor
       {
         std::lock_guard lock(mutex_);
         std::erase_if(handshaking_, [](const auto& weak) { return weak.expired(); });
+        // Each handshake under way holds a thread: past the limit a peer is turned away at
+        // once, so that silent peers cannot pile threads up.
+        if (handshaking_.size() >= WebSocketListener::maxPendingHandshakes) {
+          beast::error_code ignored;
+          socket.close(ignored);
+          acceptNext();
+          return;
+        }
         handshaking_.push_back(next);
       }
-      next->serve(tcp::socket(std::move(socket)), [weak = weak_from_this()](const auto& connection) {
-        if (auto self = weak.lock())
-          self->handshakeDone(connection);
-        else
-          connection->requestClose();
-      });
+      try {
+        next->serve(tcp::socket(std::move(socket)), [weak = weak_from_this()](const auto& connection) {
+          if (auto self = weak.lock())
+            self->handshakeDone(connection);
+          else
+            connection->requestClose();
+        });
+      } catch (...) {
+        // No thread for this peer (the system has none to give): it is dropped, and
+        // accepting goes on.
+      }
       acceptNext();
     });
   }
@@ -530,6 +570,12 @@ WebSocketListener::WebSocketListener(const std::string& address, std::uint16_t p
 WebSocketListener::~WebSocketListener() { acceptor_->close(); }
 
 std::uint16_t WebSocketListener::getPort() const noexcept { return acceptor_->port(); }
+
+std::size_t WebSocketChannel::unsentLimit(std::size_t maxMessageSize) noexcept {
+  constexpr std::size_t most = std::numeric_limits<std::size_t>::max();
+  constexpr std::size_t burst = std::size_t{8} * 1024 * 1024;
+  return maxMessageSize > most / 2 ? most : std::max(2 * maxMessageSize, burst);
+}
 
 void WebSocketListener::close() { acceptor_->close(); }
 

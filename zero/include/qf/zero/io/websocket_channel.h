@@ -30,6 +30,12 @@ class WebSocketChannel final : public SynchronizationChannel {
   static std::shared_ptr<SynchronizationChannel> connect(const std::string& host, std::uint16_t port,
                                                          const std::string& target = "/");
 
+  // Bytes that may wait to be sent, given the channel's maxMessageSize(): twice that, and at
+  // least 8 MiB so that a burst of small messages to a peer that reads is never cut. A send
+  // that would pass the limit (the peer leaves what it is sent unread) closes the channel
+  // with a reason starting "connection dropped" and raises ChannelClosed.
+  static std::size_t unsentLimit(std::size_t maxMessageSize) noexcept;
+
   // Made by connect() and WebSocketListener only: nothing else can make a connection.
   explicit WebSocketChannel(std::shared_ptr<WebSocketConnection> connection);
   ~WebSocketChannel() override;
@@ -47,13 +53,18 @@ class WebSocketChannel final : public SynchronizationChannel {
 
 // Accepts WebSocket connections on one TCP address and hands each to onAccept, after its opening
 // handshake, as a channel that is not started yet: onAccept (or whoever it passes the channel
-// to) calls start(). A peer that fails the handshake within ten seconds is dropped unseen.
+// to) calls start(). A peer that fails the handshake within ten seconds is dropped unseen, and
+// so is one for which no thread can be started; accepting goes on.
 //
 // Threads: the listener has its own thread; onAccept runs there, one call at a time. An exception
 // from onAccept is dropped along with the channel. Destroying or closing the listener stops
 // accepting and drops peers still in their handshake; channels already handed over stay open.
 class WebSocketListener {
  public:
+  // Peers in their opening handshake at once; each holds a thread until it completes, fails or
+  // times out (ten seconds). A peer that connects past the limit is closed unseen.
+  static constexpr std::size_t maxPendingHandshakes = 64;
+
   using AcceptHandler = std::function<void(std::shared_ptr<SynchronizationChannel> channel)>;
 
   // Listens on address ("127.0.0.1", "::", "localhost", ...) and port; port 0 picks a free one
