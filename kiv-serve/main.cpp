@@ -6,7 +6,9 @@
 
 #include <pthread.h>
 
+#include <chrono>
 #include <csignal>
+#include <ctime>
 #include <exception>
 #include <iostream>
 #include <memory>
@@ -35,8 +37,13 @@ int serve(const kiv::serve::ServeOptions& options, const sigset_t& stopSignals) 
   std::cout << "kiv-serve: listening on ws://" << options.host << ":" << listener.getPort() << "/"
             << std::endl;
 
-  int received = 0;
-  sigwait(&stopSignals, &received);
+  // Once a second: close the connections that idled too long, unless a stop signal came.
+  int received = -1;
+  while (received < 0) {
+    const timespec second{1, 0};
+    received = sigtimedwait(&stopSignals, nullptr, &second);
+    if (received < 0 && options.idleSeconds > 0) server.closeIdle(std::chrono::seconds(options.idleSeconds));
+  }
   std::cout << "kiv-serve: stopping on " << (received == SIGINT ? "SIGINT" : "SIGTERM") << std::endl;
   listener.close();
   server.close();

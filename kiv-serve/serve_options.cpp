@@ -31,6 +31,9 @@ std::string serveUsage() {
          "  --max-packet BYTES     largest packet accepted or sent (default 16777216)\n"
          "  --max-connections N    connections served at once; more are closed at once\n"
          "                         (default 64)\n"
+         "  --idle-seconds N       close a connection that has made no request for N\n"
+         "                         seconds, unless it observes the repository; 0 never\n"
+         "                         does (default 600)\n"
          "  --help                 print this text and exit\n";
 }
 
@@ -43,7 +46,8 @@ ParsedOptions parseServeOptions(const std::vector<std::string>& arguments) {
       options.help = true;
       return {options, ""};
     }
-    if (name != "--port" && name != "--host" && name != "--max-packet" && name != "--max-connections") {
+    if (name != "--port" && name != "--host" && name != "--max-packet" && name != "--max-connections" &&
+        name != "--idle-seconds") {
       return {std::nullopt, "unknown option " + name};
     }
     if (i + 1 == arguments.size()) return {std::nullopt, name + " needs a value"};
@@ -61,6 +65,11 @@ ParsedOptions parseServeOptions(const std::vector<std::string>& arguments) {
       if (!bytes)
         return {std::nullopt, "--max-packet takes a number of bytes from 1024 to 4294967296, not " + value};
       options.maxPacketBytes = static_cast<std::size_t>(*bytes);
+    } else if (name == "--idle-seconds") {
+      const auto seconds = readNumber(value, 0, 31 * 24 * 3600);
+      if (!seconds)
+        return {std::nullopt, "--idle-seconds takes a number of seconds up to 2678400, not " + value};
+      options.idleSeconds = static_cast<std::size_t>(*seconds);
     } else {
       const auto count = readNumber(value, 1, 100000);
       if (!count) return {std::nullopt, "--max-connections takes a number from 1 to 100000, not " + value};

@@ -14,6 +14,7 @@ struct ServeOptions {
   std::uint16_t port = 0;  // 0: a free port, printed once listening
   std::size_t maxPacketBytes = std::size_t{16} * 1024 * 1024;
   std::size_t maxConnections = 64;
+  std::size_t idleSeconds = 600;  // 0: connections may stay idle for ever
   bool help = false;
 };
 

@@ -88,7 +88,7 @@ int main() {
   HistoryLog log;
 
   section("kiv-serve serves a bare repository");
-  team_over_the_network::ServerProcess server(KIV_SERVE_PROGRAM);
+  kiv::serve::ServerProcess server(KIV_SERVE_PROGRAM);
   std::cout << server.greeting() << "\n";
 
   section("ann clones it over the network, adds cards and pushes");

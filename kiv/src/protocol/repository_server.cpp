@@ -30,7 +30,15 @@ struct RepositoryServer::State {
   struct Connection {
     std::shared_ptr<PacketTransport> transport;
     bool observing = false;
+    std::chrono::steady_clock::time_point lastRequest = std::chrono::steady_clock::now();
   };
+
+  void noteRequest(std::size_t id) {
+    const std::lock_guard<std::mutex> lock(connectionsMutex);
+    if (const auto found = connections.find(id); found != connections.end()) {
+      found->second.lastRequest = std::chrono::steady_clock::now();
+    }
+  }
 
   explicit State(LocalRepository repository) : served(std::move(repository)) {}
 
@@ -120,9 +128,10 @@ void RepositoryServer::addConnection(std::shared_ptr<qf::zero::io::Synchronizati
   const auto on = [&](PacketType type, std::function<JSONPacket(State&, const JSONPacket&)> answer) {
     transport->setPacketHandler(
         textOf(type),
-        [weak, answer = std::move(answer)](const JSONPacket& request) -> boost::optional<JSONPacket> {
+        [weak, id, answer = std::move(answer)](const JSONPacket& request) -> boost::optional<JSONPacket> {
           const std::shared_ptr<State> state = weak.lock();
           if (!state) qf::zero::reportException(qf0::messages::ChannelClosed("the server is closed"));
+          state->noteRequest(id);
           return answer(*state, request);
         },
         qf::zero::io::PacketPromiseMode::OnWorkerThread);
@@ -155,6 +164,21 @@ std::size_t RepositoryServer::observerCount() const {
     observing += connection.observing && connection.transport->isOpen() ? 1 : 0;
   }
   return observing;
+}
+
+std::size_t RepositoryServer::closeIdle(std::chrono::milliseconds idle) {
+  const auto now = std::chrono::steady_clock::now();
+  std::vector<std::shared_ptr<PacketTransport>> idleOnes;
+  {
+    const std::lock_guard<std::mutex> lock(state_->connectionsMutex);
+    for (const auto& [id, connection] : state_->connections) {
+      if (!connection.observing && connection.transport->isOpen() && now - connection.lastRequest > idle) {
+        idleOnes.push_back(connection.transport);
+      }
+    }
+  }
+  for (const auto& transport : idleOnes) transport->close();
+  return idleOnes.size();
 }
 
 // The transports are closed outside the locks: closing waits for handlers that may be

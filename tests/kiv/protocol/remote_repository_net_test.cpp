@@ -122,6 +122,21 @@ TEST_F(OverTheNetwork, ClientsCloneEditPushMergeAndPullUntilTheyAgree) {
   EXPECT_EQ(server->connectionCount(), 2u);
 }
 
+TEST_F(OverTheNetwork, IdleConnectionsAreClosedButObserversStay) {
+  RemoteClone idle = cloneServed();
+  RemoteClone observer = cloneServed();
+  observer.repository->startObservingOrigin();
+  EXPECT_EQ(server->closeIdle(std::chrono::hours(1)), 0u);
+  EXPECT_EQ(server->closeIdle(std::chrono::milliseconds(0)), 1u);
+  EXPECT_EQ(server->connectionCount(), 1u);
+  EXPECT_EQ(server->observerCount(), 1u);
+  // Closed from the server's side: the exchange fails ("ExchangeFailed" or "ChannelClosed",
+  // depending on whether the client heard of the close before sending).
+  EXPECT_THROW(idle.origin->pullRepoInfo(), foundation::core::except::ExceptionBase);
+  EXPECT_NO_THROW(observer.origin->pullRepoInfo());
+  observer.repository->stopObservingOrigin();
+}
+
 TEST_F(OverTheNetwork, RepoInfoTellsBarenessAndHead) {
   RemoteClone a = cloneServed();
   const kiv::protocol::RepoInfo info = a.origin->pullRepoInfo();

@@ -22,6 +22,7 @@
 #include "kiv/metamodel/local_repository.h"
 #include "qf/zero/io/synchronization_channel.h"
 
+#include <chrono>
 #include <cstddef>
 #include <memory>
 
@@ -43,6 +44,11 @@ class RepositoryServer {
   // Connections still open, and how many of them observe the repository.
   std::size_t connectionCount() const;
   std::size_t observerCount() const;
+
+  // Closes the connections that have made no request for longer than `idle`, except those
+  // that observe the repository (waiting for notices is what they are there for). Returns
+  // how many it closed. Call it now and then (kiv-serve does, every second).
+  std::size_t closeIdle(std::chrono::milliseconds idle);
 
   // Closes every connection and waits for their handlers to end. Idempotent.
   void close();

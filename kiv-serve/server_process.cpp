@@ -10,7 +10,7 @@
 
 extern char** environ;
 
-namespace team_over_the_network {
+namespace kiv::serve {
 
 namespace {
 
@@ -63,15 +63,17 @@ ServerProcess::ServerProcess(const std::string& program) {
 
 ServerProcess::~ServerProcess() { stop(); }
 
-void ServerProcess::stop() noexcept {
+int ServerProcess::stop() noexcept {
+  int exitStatus = -1;
   if (pid_ > 0) {
     kill(pid_, SIGTERM);
     int status = 0;
-    waitpid(pid_, &status, 0);
+    if (waitpid(pid_, &status, 0) == pid_ && WIFEXITED(status)) exitStatus = WEXITSTATUS(status);
     pid_ = -1;
   }
   if (output_ >= 0) close(output_);
   output_ = -1;
+  return exitStatus;
 }
 
-}  // namespace team_over_the_network
+}  // namespace kiv::serve

@@ -7,7 +7,7 @@
 #include <cstdint>
 #include <string>
 
-namespace team_over_the_network {
+namespace kiv::serve {
 
 class ServerProcess {
  public:
@@ -22,13 +22,15 @@ class ServerProcess {
   // What the server printed when it began listening.
   const std::string& greeting() const { return greeting_; }
 
- private:
-  void stop() noexcept;
+  // Sends SIGTERM and waits for the server to end; returns its exit status (-1 when it did
+  // not exit normally, or was stopped before).
+  int stop() noexcept;
 
+ private:
   pid_t pid_ = -1;
   int output_ = -1;
   std::uint16_t port_ = 0;
   std::string greeting_;
 };
 
-}  // namespace team_over_the_network
+}  // namespace kiv::serve
