@@ -26,14 +26,16 @@ int serve(const kiv::serve::ServeOptions& options, const sigset_t& stopSignals) 
 
   kiv::protocol::RepositoryServer server(served);
   qf::zero::io::WebSocketListener listener(
-      options.host, options.port, [&](std::shared_ptr<qf::zero::io::SynchronizationChannel> channel) {
+      options.host, options.port,
+      [&](std::shared_ptr<qf::zero::io::SynchronizationChannel> channel) {
         if (server.connectionCount() >= options.maxConnections) {
           channel->close();
           return;
         }
         channel->setMaxMessageSize(options.maxPacketBytes);
         server.addConnection(std::move(channel));
-      });
+      },
+      options.token.empty() ? std::string() : "/" + options.token);
   std::cout << "kiv-serve: listening on ws://" << options.host << ":" << listener.getPort() << "/"
             << std::endl;
 

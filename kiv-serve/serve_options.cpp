@@ -31,6 +31,8 @@ std::string serveUsage() {
          "  --max-packet BYTES     largest packet accepted or sent (default 16777216)\n"
          "  --max-connections N    connections served at once; more are closed at once\n"
          "                         (default 64)\n"
+         "  --token TOKEN          serve only clients that connect to ws://HOST:PORT/TOKEN;\n"
+         "                         others are answered 403 (letters, digits, '-', '_', '.')\n"
          "  --idle-seconds N       close a connection that has made no request for N\n"
          "                         seconds, unless it observes the repository; 0 never\n"
          "                         does (default 600)\n"
@@ -47,7 +49,7 @@ ParsedOptions parseServeOptions(const std::vector<std::string>& arguments) {
       return {options, ""};
     }
     if (name != "--port" && name != "--host" && name != "--max-packet" && name != "--max-connections" &&
-        name != "--idle-seconds") {
+        name != "--idle-seconds" && name != "--token") {
       return {std::nullopt, "unknown option " + name};
     }
     if (i + 1 == arguments.size()) return {std::nullopt, name + " needs a value"};
@@ -65,6 +67,12 @@ ParsedOptions parseServeOptions(const std::vector<std::string>& arguments) {
       if (!bytes)
         return {std::nullopt, "--max-packet takes a number of bytes from 1024 to 4294967296, not " + value};
       options.maxPacketBytes = static_cast<std::size_t>(*bytes);
+    } else if (name == "--token") {
+      const bool plain = !value.empty() && value.find_first_not_of(
+                                               "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz"
+                                               "0123456789-_.") == std::string::npos;
+      if (!plain) return {std::nullopt, "--token takes letters, digits, '-', '_' and '.' only"};
+      options.token = value;
     } else if (name == "--idle-seconds") {
       const auto seconds = readNumber(value, 0, 31 * 24 * 3600);
       if (!seconds)

@@ -15,6 +15,7 @@ struct ServeOptions {
   std::size_t maxPacketBytes = std::size_t{16} * 1024 * 1024;
   std::size_t maxConnections = 64;
   std::size_t idleSeconds = 600;  // 0: connections may stay idle for ever
+  std::string token;              // empty: no token is asked for
   bool help = false;
 };
 

@@ -7,6 +7,7 @@
 #include <unistd.h>
 
 #include <stdexcept>
+#include <vector>
 
 extern char** environ;
 
@@ -29,16 +30,18 @@ std::string readLine(int fd, int seconds) {
 
 }  // namespace
 
-ServerProcess::ServerProcess(const std::string& program) {
+ServerProcess::ServerProcess(const std::string& program, const std::vector<std::string>& options) {
   int pipeEnds[2];
   if (pipe(pipeEnds) != 0) throw std::runtime_error("cannot make a pipe");
   posix_spawn_file_actions_t actions;
   posix_spawn_file_actions_init(&actions);
   posix_spawn_file_actions_adddup2(&actions, pipeEnds[1], STDOUT_FILENO);
   posix_spawn_file_actions_addclose(&actions, pipeEnds[0]);
-  const char* arguments[] = {program.c_str(), "--port", "0", nullptr};
+  std::vector<const char*> arguments{program.c_str(), "--port", "0"};
+  for (const std::string& option : options) arguments.push_back(option.c_str());
+  arguments.push_back(nullptr);
   const int spawned =
-      posix_spawn(&pid_, program.c_str(), &actions, nullptr, const_cast<char**>(arguments), environ);
+      posix_spawn(&pid_, program.c_str(), &actions, nullptr, const_cast<char**>(arguments.data()), environ);
   posix_spawn_file_actions_destroy(&actions);
   close(pipeEnds[1]);
   output_ = pipeEnds[0];

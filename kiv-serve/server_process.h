@@ -6,14 +6,16 @@
 
 #include <cstdint>
 #include <string>
+#include <vector>
 
 namespace kiv::serve {
 
 class ServerProcess {
  public:
-  // Starts `program --port 0` and waits (at most ten seconds) for the line that names the
+  // Starts `program --port 0 options...` and waits (at most ten seconds) for the line that names the
   // port it listens on. Raises std::runtime_error when it cannot be started or says nothing.
-  explicit ServerProcess(const std::string& program);
+  // `options` are passed on after "--port 0".
+  explicit ServerProcess(const std::string& program, const std::vector<std::string>& options = {});
   ~ServerProcess();
   ServerProcess(const ServerProcess&) = delete;
   ServerProcess& operator=(const ServerProcess&) = delete;

@@ -14,13 +14,13 @@
 namespace {
 
 struct Client {
-  explicit Client(std::uint16_t port) {
+  explicit Client(std::uint16_t port, const std::string& target = "/") {
     {
       qf::zero::Transaction transaction = repositories->beginTransaction();
       server = kiv::RemoteRepository::create(repositories);
       transaction.commit();
     }
-    server->setSynchronizationChannel(qf::zero::io::WebSocketChannel::connect("127.0.0.1", port));
+    server->setSynchronizationChannel(qf::zero::io::WebSocketChannel::connect("127.0.0.1", port, target));
     repository = server->synchronousClone(kiv::RepoType::Regular);
     workspace = repository->getWorkspace(user);
     kiv::loadContext(workspace);
@@ -53,6 +53,17 @@ TEST(KivServe, ServesClientsOverWebSocketAndStopsCleanlyOnSigterm) {
         bob.user->getInstances(tm.node, qf::zero::query::SearchClassMatchMode::IncludeSubclasses).size(), 1u);
     EXPECT_TRUE(bob.repository->isEquivalent(ann.repository));
   }
+  EXPECT_EQ(served.stop(), 0);
+}
+
+TEST(KivServe, WithATokenServesOnlyClientsThatPresentIt) {
+  kiv::MetaPackageKiv::getInstance();
+  kiv::serve::ServerProcess served(KIV_SERVE_PROGRAM, {"--token", "team-42"});
+  using ConnectionFailed = foundation::core::except::Exception<qf0::messages::ConnectionFailed>;
+  EXPECT_THROW(Client(served.port()), ConnectionFailed);
+  EXPECT_THROW(Client(served.port(), "/team-43"), ConnectionFailed);
+  Client member(served.port(), "/team-42");
+  EXPECT_EQ(member.repository->getHead()->getName(), u"master");
   EXPECT_EQ(served.stop(), 0);
 }
 

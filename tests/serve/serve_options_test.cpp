@@ -45,6 +45,9 @@ const std::vector<CommandLine> commandLines = {
     {"MissingValue", {"--port"}, "--port needs a value"},
     {"UnknownOption", {"--port", "0", "--verbose"}, "unknown option --verbose"},
     {"EmptyHost", {"--port", "0", "--host", ""}, "--host needs an address"},
+    {"Token", {"--port", "0", "--token", "a-Z_0.9"}, ""},
+    {"TokenWithASlash", {"--port", "0", "--token", "a/b"}, "--token takes"},
+    {"EmptyToken", {"--port", "0", "--token", ""}, "--token takes"},
 };
 
 INSTANTIATE_TEST_SUITE_P(Rows, ServeCommandLine, ::testing::ValuesIn(commandLines),

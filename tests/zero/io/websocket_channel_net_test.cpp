@@ -177,6 +177,25 @@ TEST(WebSocketListener, PeersThatFailOrStallTheHandshakeAreDroppedUnseen) {
   EXPECT_EQ(inbox->next(), "still open");
 }
 
+TEST(WebSocketListener, AListenerWithATargetServesOnlyPeersThatAskForIt) {
+  AcceptedChannels accepted;
+  WebSocketListener listener("127.0.0.1", 0, accepted.handler(), "/s3cret");
+  EXPECT_THROW(WebSocketChannel::connect("127.0.0.1", listener.getPort(), "/"), ConnectionFailed);
+  EXPECT_THROW(WebSocketChannel::connect("127.0.0.1", listener.getPort(), "/s3cres"), ConnectionFailed);
+  EXPECT_THROW(WebSocketChannel::connect("127.0.0.1", listener.getPort(), "/s3cret/"), ConnectionFailed);
+  {
+    RawPeer wrong(listener.getPort());
+    EXPECT_EQ(wrong.handshake(), "HTTP/1.1 403 Forbidden");
+  }
+  auto client = WebSocketChannel::connect("127.0.0.1", listener.getPort(), "/s3cret");
+  auto server = accepted.next();
+  ASSERT_TRUE(server);
+  EXPECT_EQ(accepted.waiting(), 0u) << "a refused peer was handed over";
+  auto inbox = Inbox::startOn(*server);
+  client->send("let in");
+  EXPECT_EQ(inbox->next(), "let in");
+}
+
 std::size_t threadCount() {
   std::size_t count = 0;
   for ([[maybe_unused]] const auto& task : std::filesystem::directory_iterator("/proc/self/task")) ++count;

@@ -23,6 +23,7 @@
 #include <boost/asio/post.hpp>
 #include <boost/asio/steady_timer.hpp>
 #include <boost/beast/core.hpp>
+#include <boost/beast/http.hpp>
 #include <boost/beast/websocket.hpp>
 
 #include <algorithm>
@@ -42,6 +43,7 @@ namespace {
 namespace asio = boost::asio;
 namespace beast = boost::beast;
 namespace websocket = boost::beast::websocket;
+namespace http = boost::beast::http;
 using tcp = boost::asio::ip::tcp;
 
 // Opening handshake, TCP connect included.
@@ -123,19 +125,39 @@ class WebSocketConnection : public std::enable_shared_from_this<WebSocketConnect
   // Server side, on the listener's thread: takes the accepted socket, launches the I/O thread and
   // runs the opening handshake there. onHandshake runs on the I/O thread once it succeeded; on
   // failure the connection ends by itself.
-  void serve(tcp::socket socket, HandshakeDone onHandshake) {
+  // A peer that asks for another target than `requiredTarget` (when not empty) is answered
+  // "403 Forbidden" and dropped.
+  void serve(tcp::socket socket, std::string requiredTarget, HandshakeDone onHandshake) {
     ws_.emplace(std::move(socket));
-    configure();
-    ws_->async_accept([this, onHandshake = std::move(onHandshake)](beast::error_code ec) {
-      if (ec) {
-        finish("opening handshake failed: " + ec.message());
-        return;
-      }
-      if (finished_) return;
-      handshakeDone_ = true;
-      readNext();
-      onHandshake(shared_from_this());
-    });
+    beast::error_code ignored;
+    beast::get_lowest_layer(*ws_).socket().set_option(tcp::no_delay(true), ignored);
+    beast::get_lowest_layer(*ws_).expires_after(openTimeout);
+    http::async_read(ws_->next_layer(), handshakeBuffer_, upgrade_,
+                     [this, requiredTarget = std::move(requiredTarget), onHandshake = std::move(onHandshake)](
+                         beast::error_code ec, std::size_t) mutable {
+                       if (ec) {
+                         finish("opening handshake failed: " + ec.message());
+                         return;
+                       }
+                       if (!requiredTarget.empty() && !sameText(upgrade_.target(), requiredTarget)) {
+                         refuse();
+                         return;
+                       }
+                       // From here the WebSocket layer keeps the time; both must not be armed at once.
+                       beast::get_lowest_layer(*ws_).expires_never();
+                       configure();
+                       ws_->async_accept(upgrade_,
+                                         [this, onHandshake = std::move(onHandshake)](beast::error_code ec) {
+                                           if (ec) {
+                                             finish("opening handshake failed: " + ec.message());
+                                             return;
+                                           }
+                                           if (finished_) return;
+                                           handshakeDone_ = true;
+                                           readNext();
+                                           onHandshake(shared_from_this());
+                                         });
+                     });
     launch();
   }
 
@@ -186,6 +208,27 @@ class WebSocketConnection : public std::enable_shared_from_this<WebSocketConnect
   }
 
  private:
+  // Compares in time that does not depend on where the texts differ: the target may hold a
+  // shared secret.
+  static bool sameText(beast::string_view given, const std::string& expected) {
+    unsigned char difference = given.size() == expected.size() ? 0 : 1;
+    for (std::size_t i = 0; i < expected.size(); ++i) {
+      difference |= static_cast<unsigned char>(expected[i] ^ (i < given.size() ? given[i] : 0));
+    }
+    return difference == 0;
+  }
+
+  void refuse() {
+    auto response =
+        std::make_shared<http::response<http::string_body>>(http::status::forbidden, upgrade_.version());
+    response->set(http::field::connection, "close");
+    response->body() = "forbidden\n";
+    response->prepare_payload();
+    http::async_write(ws_->next_layer(), *response, [this, response](beast::error_code, std::size_t) {
+      finish("opening handshake refused: the peer asked for another target");
+    });
+  }
+
   void configure() {
     // Packets are whole messages, mostly answered at once: waiting to coalesce them only adds
     // the peer's delayed-acknowledgement time to every exchange.
@@ -372,6 +415,8 @@ class WebSocketConnection : public std::enable_shared_from_this<WebSocketConnect
   std::optional<websocket::stream<beast::tcp_stream>> ws_;
   asio::steady_timer closeTimer_{io_};
   beast::flat_buffer readBuffer_;
+  beast::flat_buffer handshakeBuffer_;
+  http::request<http::empty_body> upgrade_;  // the peer's opening request, server side
   std::size_t readLimit_ = 0;
   std::deque<std::string> outbox_;      // front() is being written while writing_
   std::atomic<std::size_t> unsent_{0};  // bytes sent by the user and not yet written
@@ -422,7 +467,8 @@ void WebSocketChannel::setMaxMessageSize(std::size_t bytes) { connection_->state
 // right away, so a slow handshake never holds up the next peer.
 class WebSocketListener::Acceptor : public std::enable_shared_from_this<Acceptor> {
  public:
-  explicit Acceptor(AcceptHandler onAccept) : onAccept_(std::move(onAccept)) {}
+  Acceptor(AcceptHandler onAccept, std::string requiredTarget)
+      : onAccept_(std::move(onAccept)), requiredTarget_(std::move(requiredTarget)) {}
 
   std::uint16_t port() const noexcept { return port_; }
 
@@ -507,12 +553,13 @@ class WebSocketListener::Acceptor : public std::enable_shared_from_this<Acceptor
         handshaking_.push_back(next);
       }
       try {
-        next->serve(tcp::socket(std::move(socket)), [weak = weak_from_this()](const auto& connection) {
-          if (auto self = weak.lock())
-            self->handshakeDone(connection);
-          else
-            connection->requestClose();
-        });
+        next->serve(tcp::socket(std::move(socket)), requiredTarget_,
+                    [weak = weak_from_this()](const auto& connection) {
+                      if (auto self = weak.lock())
+                        self->handshakeDone(connection);
+                      else
+                        connection->requestClose();
+                    });
       } catch (...) {
         // No thread for this peer (the system has none to give): it is dropped, and
         // accepting goes on.
@@ -552,6 +599,7 @@ class WebSocketListener::Acceptor : public std::enable_shared_from_this<Acceptor
   tcp::acceptor acceptor_{io_};
   asio::steady_timer retryTimer_{io_};
   const AcceptHandler onAccept_;
+  const std::string requiredTarget_;
   std::uint16_t port_ = 0;
 
   std::mutex mutex_;  // guards open_ and handshaking_
@@ -561,8 +609,9 @@ class WebSocketListener::Acceptor : public std::enable_shared_from_this<Acceptor
   OwnedThread thread_;
 };
 
-WebSocketListener::WebSocketListener(const std::string& address, std::uint16_t port, AcceptHandler onAccept)
-    : acceptor_(std::make_shared<Acceptor>(std::move(onAccept))) {
+WebSocketListener::WebSocketListener(const std::string& address, std::uint16_t port, AcceptHandler onAccept,
+                                     std::string requiredTarget)
+    : acceptor_(std::make_shared<Acceptor>(std::move(onAccept), std::move(requiredTarget))) {
   acceptor_->listen(address, port);
   acceptor_->launch();
 }

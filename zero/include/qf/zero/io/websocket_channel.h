@@ -69,7 +69,11 @@ class WebSocketListener {
 
   // Listens on address ("127.0.0.1", "::", "localhost", ...) and port; port 0 picks a free one
   // (see getPort()). Raises ListenFailed when the address cannot be listened on.
-  WebSocketListener(const std::string& address, std::uint16_t port, AcceptHandler onAccept);
+  // With a `requiredTarget` (e.g. "/" followed by a shared token), a peer whose opening
+  // request asks for any other target is answered "403 Forbidden" and dropped unseen; the
+  // comparison takes the same time wherever the texts differ.
+  WebSocketListener(const std::string& address, std::uint16_t port, AcceptHandler onAccept,
+                    std::string requiredTarget = "");
   ~WebSocketListener();
   WebSocketListener(const WebSocketListener&) = delete;
   WebSocketListener& operator=(const WebSocketListener&) = delete;
