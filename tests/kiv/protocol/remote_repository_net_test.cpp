@@ -391,7 +391,8 @@ const std::vector<HostileRequest> hostileRequests = {
      "qf0:messages/WrongJsonType"},
     {"ParentNeitherCarriedNorKnown", push,
      [](JsonValue& body) {
-       entryOfType(body, "kiv.Commit")["content"]["parents"] = {"0b2c5a9e-3f1d-4c2b-9a8e-7d6c5b4a3f21"};
+       entryOfType(body, "kiv.Commit")["content"]["parents"] =
+           JsonValue::array({"0b2c5a9e-3f1d-4c2b-9a8e-7d6c5b4a3f21"});
      },
      "qf0:messages/DanglingReference"},
     {"DeltaNotCarried", push,
@@ -412,8 +413,8 @@ const std::vector<HostileRequest> hostileRequests = {
          if (entry["type"] == "kiv.Commit") commits.push_back(&entry);
        }
        ASSERT_GE(commits.size(), 2u);
-       (*commits[0])["content"]["parents"] = {(*commits[1])["id"]};
-       (*commits[1])["content"]["parents"] = {(*commits[0])["id"]};
+       (*commits[0])["content"]["parents"] = JsonValue::array({(*commits[1])["id"]});
+       (*commits[1])["content"]["parents"] = JsonValue::array({(*commits[0])["id"]});
      },
      "kiv:messages/MalformedHistory"},
     {"PullWithNonsense", "Pull", [](JsonValue& body) { body = "nonsense"; },
