@@ -1,11 +1,14 @@
 // The two branch sets of a history ("previous" and "current"), reached by reflection: the
-// history's class belongs to the protocol layer above the repositories.
+// history's class belongs to the protocol layer above the repositories; and the end of a
+// history made for one exchange.
 #pragma once
 
 #include "kiv/metamodel/branch.h"
 #include "kiv/metamodel/meta_package_kiv.h"
 #include "kiv/metamodel/protocol/history.h"
+#include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/reference_collection.h"
+#include "qf/zero/core/transaction.h"
 #include "qf/zero/core/value.h"
 
 #include <vector>
@@ -34,6 +37,19 @@ inline std::vector<Branch> branchesOf(const protocol::History& history, bool pre
 // Adds to one set. REQUIRES: an open transaction on the history's model.
 inline void addBranch(const protocol::History& history, bool previous, const Branch& branch) {
   collectionOf(history, previous).add(branch);
+}
+
+// Destroys a history made for one exchange, in a transaction of its own. Raises nothing:
+// a scratch element left behind loses nothing.
+inline void dropHistory(const protocol::History& history) noexcept {
+  try {
+    if (history && history.isLive()) {
+      qf::zero::Transaction transaction = history.getModel()->beginTransaction();
+      protocol::History(history).destroy();
+      transaction.commit();
+    }
+  } catch (...) {
+  }
 }
 
 }  // namespace kiv::repository

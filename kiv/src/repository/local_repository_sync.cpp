@@ -69,18 +69,6 @@ void deliverPush(const LocalRepository& self, const Repository& origin, const pr
   origin->syncBranches(self);
 }
 
-void dropHistory(const protocol::History& history) noexcept {
-  try {
-    if (isPresent(history)) {
-      qf::zero::Transaction transaction = history.getModel()->beginTransaction();
-      protocol::History(history).destroy();
-      transaction.commit();
-    }
-  } catch (...) {
-    // The history is scratch: leaving it behind loses nothing.
-  }
-}
-
 }  // namespace
 
 std::future<void> LocalRepository::Impl::push(PushMode mode) {
@@ -103,10 +91,10 @@ std::future<void> LocalRepository::Impl::push(PushMode mode) {
     try {
       deliverPush(self, origin, history);
     } catch (...) {
-      dropHistory(history);
+      repository::dropHistory(history);
       throw;
     }
-    dropHistory(history);
+    repository::dropHistory(history);
   });
 }
 

@@ -59,18 +59,6 @@ protocol::RepoInfo readRepoInfo(const qf::zero::JsonValue& body) {
   return info;
 }
 
-void dropHistory(const protocol::History& history) noexcept {
-  try {
-    if (isPresent(history)) {
-      qf::zero::Transaction transaction = history.getModel()->beginTransaction();
-      protocol::History(history).destroy();
-      transaction.commit();
-    }
-  } catch (...) {
-    // A scratch element: leaving it behind loses nothing.
-  }
-}
-
 }  // namespace
 
 RemoteRepository asRemote(const Repository& repository) {
@@ -142,10 +130,10 @@ void RemoteRepository::Impl::pullObjects() {
     syncBranches(unpackHistory(reply.getJson()));
     transaction.commit();
   } catch (...) {
-    dropHistory(request);
+    repository::dropHistory(request);
     throw;
   }
-  dropHistory(request);
+  repository::dropHistory(request);
 }
 
 protocol::RepoInfo RemoteRepository::Impl::pullRepoInfo() {
