@@ -87,10 +87,12 @@ qf::zero::io::JSONPacket answerPush(const LocalRepository& self, const qf::zero:
   const Repository pushed = self->unpackHistory(request.getJson());
   if (!self->canPush(receivedHistoryIn(pushed.getModel()))) {
     transaction.cancel();
+    self->lastUnpackedModel_ = qf::zero::Model();
     return reply(PacketType::CannotPush);
   }
   self->syncBranches(pushed);
   transaction.commit();
+  self->lastUnpackedModel_ = qf::zero::Model();  // the scratch history has served
   return reply(PacketType::OK);
 }
 

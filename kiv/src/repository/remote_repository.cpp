@@ -129,6 +129,7 @@ void RemoteRepository::Impl::pullObjects() {
     qf::zero::Transaction transaction = getModelImpl()->beginTransaction();
     syncBranches(unpackHistory(reply.getJson()));
     transaction.commit();
+    lastUnpackedModel_ = qf::zero::Model();  // the scratch history has served
   } catch (...) {
     repository::dropHistory(request);
     throw;
