@@ -69,6 +69,21 @@ void deliverPush(const LocalRepository& self, const Repository& origin, const pr
   origin->syncBranches(self);
 }
 
+// Drops the history of a push; behind a remote origin under its exchange lock, since a
+// change notice may be pulling into the same model meanwhile.
+void dropPushed(const Repository& origin, const protocol::History& history) noexcept {
+  try {
+    if (const RemoteRepository remote = asRemote(origin)) {
+      const std::unique_lock<std::mutex> lock = lockExchanges(remote);
+      repository::dropHistory(history);
+      return;
+    }
+  } catch (...) {
+    return;  // no lock to take: the history stays behind, which loses nothing
+  }
+  repository::dropHistory(history);
+}
+
 }  // namespace
 
 std::future<void> LocalRepository::Impl::push(PushMode mode) {
@@ -91,10 +106,10 @@ std::future<void> LocalRepository::Impl::push(PushMode mode) {
     try {
       deliverPush(self, origin, history);
     } catch (...) {
-      repository::dropHistory(history);
+      dropPushed(origin, history);
       throw;
     }
-    repository::dropHistory(history);
+    dropPushed(origin, history);
   });
 }
 
