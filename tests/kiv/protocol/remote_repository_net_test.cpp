@@ -265,6 +265,23 @@ TEST_F(OverTheNetwork, ALocalRepositoryServesThePeerOnItsOwnTransport) {
   EXPECT_EQ(alone->getNumRemoteObservers(), 0);
 }
 
+// A request over the server's packet limit ends that connection; nothing is read from it,
+// and the server goes on serving others.
+TEST_F(OverTheNetwork, ARequestOverThePacketLimitEndsOnlyItsConnection) {
+  auto [mine, theirs] = InProcessChannel::createPair();
+  theirs->setMaxMessageSize(4096);
+  server->addConnection(theirs);
+  PacketTransport peer(mine);
+  const std::string before = servedDump();
+  EXPECT_THROW(
+      peer.sendAndExpectPacket(JSONPacket("Push", std::string(8192, 'x')), "OK", std::chrono::seconds(30)),
+      Exception<qf0::messages::ExchangeFailed>);
+  EXPECT_EQ(servedDump(), before);
+  RemoteClone other = cloneServed();
+  addNode(other, u"still served");
+  EXPECT_TRUE(completes(other.workspace->push(kiv::PushMode::TryPush)));
+}
+
 // A server that answers badly: the client gets a clear error and its repository model is
 // as it was.
 struct BadReply {
