@@ -71,14 +71,7 @@ class OverTheNetwork : public ::testing::Test {
     return clone;
   }
 
-  ModelElement addNode(RemoteClone& clone, const std::u16string& name) {
-    ModelElement node;
-    clone.workspace->commitTransaction([&] {
-      node = tm.node.instantiate(clone.user);
-      tm.setName(node, name);
-    });
-    return node;
-  }
+  ModelElement addNode(RemoteClone& clone, const std::u16string& name) { return addNodeTo(tm, clone, name); }
 
   // What the served repository holds, read while no request is in flight.
   std::string servedDump() const { return dumpOf(serverModel); }

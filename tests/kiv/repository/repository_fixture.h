@@ -93,6 +93,18 @@ struct Clone {
   kiv::Commit tip() const { return head()->getTip(); }
 };
 
+// A new Node named `name`, made in one user transaction of `clone` (one commit). Any
+// clone with a user model and a workspace will do, in process or over a transport.
+template <class AnyClone>
+ModelElement addNodeTo(const support::TestMetamodel& tm, AnyClone& clone, const std::u16string& name) {
+  ModelElement node;
+  clone.workspace->commitTransaction([&] {
+    node = tm.node.instantiate(clone.user);
+    tm.setName(node, name);
+  });
+  return node;
+}
+
 // One repository model with a bare origin made by init, and clones of it.
 class RepositoryModels {
  public:
@@ -110,15 +122,7 @@ class RepositoryModels {
     return clone;
   }
 
-  // A new Node named `name`, made in one user transaction of `clone` (one commit).
-  ModelElement addNode(Clone& clone, const std::u16string& name) {
-    ModelElement node;
-    clone.workspace->commitTransaction([&] {
-      node = tm.node.instantiate(clone.user);
-      tm.setName(node, name);
-    });
-    return node;
-  }
+  ModelElement addNode(Clone& clone, const std::u16string& name) { return addNodeTo(tm, clone, name); }
 
   void rename(Clone& clone, ModelElement node, const std::u16string& name) {
     clone.workspace->commitTransaction([&] { tm.setName(node, name); });
