@@ -41,7 +41,9 @@ std::vector<StructuredType> Class::Impl::getSuperTypes() const {
 }
 
 void Class::Impl::buildCaches() const {
-  if (cachesBuilt_) return;
+  if (cachesBuilt_.load(std::memory_order_acquire)) return;
+  const std::lock_guard<std::mutex> lock(cacheMutex_);
+  if (cachesBuilt_.load(std::memory_order_relaxed)) return;
   allProperties_.clear();
   allOperations_.clear();
   std::unordered_set<const void*> seen;
@@ -62,7 +64,7 @@ void Class::Impl::buildCaches() const {
   byIndex_.assign(static_cast<std::size_t>(highest) + 1, Property());
   for (const Property& property : allProperties_)
     byIndex_[static_cast<std::size_t>(property.getIndex())] = property;
-  cachesBuilt_ = true;
+  cachesBuilt_.store(true, std::memory_order_release);
 }
 
 const std::vector<Property>& Class::Impl::getAllProperties() const {

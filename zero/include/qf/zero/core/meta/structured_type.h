@@ -5,7 +5,9 @@
 #include "qf/zero/core/meta/operation.h"
 #include "qf/zero/core/meta/type.h"
 
+#include <atomic>
 #include <memory>
+#include <mutex>
 #include <string_view>
 #include <unordered_map>
 #include <vector>
@@ -78,7 +80,11 @@ class Class::Impl : public StructuredType::Impl {
   bool isAbstract_;
   std::vector<Class> superclasses_;
   // Built on first use, after the metamodel is complete.
-  mutable bool cachesBuilt_ = false;
+  // The caches are built on first use, possibly by several threads at once (models on
+  // different threads share their metaclasses): the flag is read without the lock, and
+  // the build happens under it.
+  mutable std::mutex cacheMutex_;
+  mutable std::atomic<bool> cachesBuilt_{false};
   mutable std::vector<Property> allProperties_;
   mutable std::vector<Operation> allOperations_;
   mutable std::vector<Property> byIndex_;
