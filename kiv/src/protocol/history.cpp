@@ -188,6 +188,7 @@ History History::Impl::parseHistory(const qf::zero::JsonValue& historyJson, cons
   if (!model) qf::zero::reportException(qf0::messages::CannotCreateWithoutModel());
   qf::zero::io::JSONParser parser(std::make_unique<HistoryParseCustomizer>(model, properties),
                                   std::make_unique<TerminatorModelBuilder>(otherModel));
+  checkStorageEntries(historyJson);
   qf::zero::Transaction transaction = model->beginTransaction();
   History history;
   for (const qf::zero::io::ParseItem& item : parser.parseVerbatim(historyJson, model)) {

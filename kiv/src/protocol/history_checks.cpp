@@ -6,6 +6,9 @@
 #include "kiv/metamodel/delta_impl.h"
 #include "kiv/metamodel/object_storage_impl.h"
 #include "qf/zero/core/report_exception.h"
+#include "qf/zero/io/json_constants.h"
+
+#include <nlohmann/json.hpp>
 
 #include <set>
 #include <string>
@@ -74,6 +77,42 @@ void checkDeltaKeys(const History& history) {
   }
 }
 
+// What a storage entry's "content" must hold: the entry of the element it names, as the
+// serializer writes it.
+void checkStoredEntry(const qf::zero::JsonValue& storageEntry) {
+  using qf::zero::io::JSONConstants;
+  const auto id = storageEntry.find(JSONConstants::ID_ATTR);
+  const auto properties = storageEntry.find(JSONConstants::CONTENT_ATTR);
+  // Entries the parser refuses anyway (no id, no content, wrong JSON types) are left to it.
+  if (id == storageEntry.end() || !id->is_string() || properties == storageEntry.end() ||
+      !properties->is_object()) {
+    return;
+  }
+  const auto elementUuid = properties->find("elementUUID");
+  const auto stored = properties->find("content");
+  const bool namesElement = elementUuid != properties->end() && elementUuid->is_string() &&
+                            !elementUuid->get_ref<const std::string&>().empty() &&
+                            elementUuid->get_ref<const std::string&>() != qf::zero::toText(qf::zero::Uuid());
+  const auto refuse = [&](const std::string& what) {
+    qf::zero::reportException(messages::MalformedHistory("storage " + id->get<std::string>() + " " + what));
+  };
+  if (stored == properties->end() || stored->is_null()) {
+    if (namesElement) refuse("names an element but holds no entry");
+    return;
+  }
+  if (!namesElement) refuse("holds content but names no element");
+  if (!stored->is_object()) refuse("holds no element entry");
+  const auto type = stored->find(JSONConstants::TYPE_ATTR);
+  if (type == stored->end() || !type->is_string() || type->get_ref<const std::string&>().empty()) {
+    refuse("holds an entry without a type");
+  }
+  const auto storedId = stored->find(JSONConstants::ID_ATTR);
+  if (storedId == stored->end() || *storedId != *elementUuid) refuse("holds an entry of another element");
+  const auto storedContent = stored->find(JSONConstants::CONTENT_ATTR);
+  if (storedContent == stored->end() || !storedContent->is_object()) refuse("holds an entry without content");
+  if (stored->size() != 3) refuse("holds an entry with members of no entry");
+}
+
 }  // namespace
 
 void checkReceivedHistory(const History& history) {
@@ -81,6 +120,24 @@ void checkReceivedHistory(const History& history) {
   checkNamesOnce(history.getCurrent(), "current");
   checkAcyclic(history);
   checkDeltaKeys(history);
+}
+
+// A storage holds one element's entry: {"type": <class name>, "id": <the element's UUID>,
+// "content": {<property>: <value>, ...}}; an empty storage holds null. The user metamodel may
+// be unknown here (a bare repository serves any model), so the shape is checked, not the
+// class: a wrong entry would otherwise surface only when a clone replays it into a user
+// model, long after the history was taken in. Checked on the document, before any element
+// is made, so that no stored text is parsed twice.
+void checkStorageEntries(const qf::zero::JsonValue& document) {
+  using qf::zero::io::JSONConstants;
+  if (!document.is_object()) return;
+  const auto entries = document.find(JSONConstants::ENTRIES_ATTR);
+  if (entries == document.end() || !entries->is_array()) return;
+  for (const qf::zero::JsonValue& entry : *entries) {
+    if (!entry.is_object()) continue;
+    const auto type = entry.find(JSONConstants::TYPE_ATTR);
+    if (type != entry.end() && *type == "kiv.ObjectStorage") checkStoredEntry(entry);
+  }
 }
 
 }  // namespace kiv::protocol

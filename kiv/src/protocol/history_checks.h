@@ -11,4 +11,9 @@ namespace kiv::protocol {
 // nowhere were refused by the parse already.
 void checkReceivedHistory(const History& history);
 
+// Raises "MalformedHistory" when a storage entry of `document` does not hold the entry of the
+// element it names (or null when it names none). Entries the parser refuses anyway are
+// passed over.
+void checkStorageEntries(const qf::zero::JsonValue& document);
+
 }  // namespace kiv::protocol

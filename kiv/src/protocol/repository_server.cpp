@@ -136,17 +136,22 @@ void RepositoryServer::addConnection(std::shared_ptr<qf::zero::io::Synchronizati
         },
         qf::zero::io::PacketPromiseMode::OnWorkerThread);
   };
-  on(PacketType::PullInfo, [](State& state, const JSONPacket&) {
+  on(PacketType::PullInfo, [](State& state, const JSONPacket& request) {
+    requireNullBody(request);
     return state.alone([&] { return answerPullInfo(state.served); });
   });
   on(PacketType::Pull, [](State& state, const JSONPacket& request) {
     return state.alone([&] { return answerPull(state.served, request); });
   });
   on(PacketType::Push, [](State& state, const JSONPacket& request) { return state.push(request); });
-  on(PacketType::AddRemoteObserver,
-     [id](State& state, const JSONPacket&) { return state.observe(id, true); });
-  on(PacketType::RemoveRemoteObserver,
-     [id](State& state, const JSONPacket&) { return state.observe(id, false); });
+  on(PacketType::AddRemoteObserver, [id](State& state, const JSONPacket& request) {
+    requireNullBody(request);
+    return state.observe(id, true);
+  });
+  on(PacketType::RemoveRemoteObserver, [id](State& state, const JSONPacket& request) {
+    requireNullBody(request);
+    return state.observe(id, false);
+  });
   held->open();
 }
 

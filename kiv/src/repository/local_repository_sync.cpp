@@ -144,13 +144,20 @@ void LocalRepository::Impl::setOnReceive() {
             -> boost::optional<qf::zero::io::JSONPacket> { return answer(request); },
         qf::zero::io::PacketPromiseMode::OnWorkerThread);
   };
-  on(PacketType::PullInfo, [self](const qf::zero::io::JSONPacket&) { return answerPullInfo(self); });
+  on(PacketType::PullInfo, [self](const qf::zero::io::JSONPacket& request) {
+    requireNullBody(request);
+    return answerPullInfo(self);
+  });
   on(PacketType::Pull, [self](const qf::zero::io::JSONPacket& request) { return answerPull(self, request); });
   on(PacketType::Push, [self](const qf::zero::io::JSONPacket& request) { return answerPush(self, request); });
-  on(PacketType::AddRemoteObserver,
-     [self](const qf::zero::io::JSONPacket&) { return answerObserver(self, true); });
-  on(PacketType::RemoveRemoteObserver,
-     [self](const qf::zero::io::JSONPacket&) { return answerObserver(self, false); });
+  on(PacketType::AddRemoteObserver, [self](const qf::zero::io::JSONPacket& request) {
+    requireNullBody(request);
+    return answerObserver(self, true);
+  });
+  on(PacketType::RemoveRemoteObserver, [self](const qf::zero::io::JSONPacket& request) {
+    requireNullBody(request);
+    return answerObserver(self, false);
+  });
 }
 
 }  // namespace kiv

@@ -9,6 +9,8 @@
 #include "qf/zero/core/report_exception.h"
 #include "qf/zero/core/text.h"
 #include "qf/zero/core/transaction.h"
+#include "qf/zero/io/json_constants.h"
+#include "qf/zero/io/packet_codec.h"
 #include "repository/history_branches.h"
 
 #include <nlohmann/json.hpp>
@@ -24,12 +26,42 @@ qf::zero::Uuid identityOf(const qf::zero::ModelElement& element) {
 }
 
 using protocol::PacketType;
+using qf::zero::io::PacketCodec;
 
 qf::zero::io::JSONPacket reply(PacketType type, qf::zero::JsonValue body = nullptr) {
   return qf::zero::io::JSONPacket(Repository::Impl::toString(type), std::move(body));
 }
 
+// A pull names the asker's branch states and nothing else: a document carrying commits,
+// deltas, storages or anything else is not a pull request. Documents the parser refuses
+// anyway (not an object, no entry array, entries of wrong JSON types) are left to it.
+void requireBranchStatesOnly(const qf::zero::JsonValue& document) {
+  using qf::zero::io::JSONConstants;
+  if (!document.is_object()) return;
+  const auto entries = document.find(JSONConstants::ENTRIES_ATTR);
+  if (entries == document.end() || !entries->is_array()) return;
+  static const std::string history = qf::zero::toUtf8(protocol::History::metaClass().getQualifiedName());
+  static const std::string branch = qf::zero::toUtf8(Branch::metaClass().getQualifiedName());
+  for (const qf::zero::JsonValue& entry : *entries) {
+    if (!entry.is_object()) continue;
+    const auto type = entry.find(JSONConstants::TYPE_ATTR);
+    if (type == entry.end() || !type->is_string()) continue;
+    const std::string& name = type->get_ref<const std::string&>();
+    if (name != history && name != branch) {
+      qf::zero::reportException(messages::MalformedHistory("a pull request names branch states only, not " +
+                                                           PacketCodec::quotable(name)));
+    }
+  }
+}
+
 }  // namespace
+
+void requireNullBody(const qf::zero::io::JSONPacket& request) {
+  if (!request.getJson().is_null()) {
+    qf::zero::reportException(qf0::messages::MalformedPacket(
+        "a \"" + PacketCodec::quotable(request.getType()) + "\" request carries null"));
+  }
+}
 
 qf::zero::io::JSONPacket answerPullInfo(const LocalRepository& self) {
   const Branch head = self->getHead();
@@ -44,6 +76,7 @@ qf::zero::io::JSONPacket answerPullInfo(const LocalRepository& self) {
 // stand for the asker's are made in a transaction that is then cancelled: answering a
 // pull leaves the repository model as it was.
 qf::zero::io::JSONPacket answerPull(const LocalRepository& self, const qf::zero::io::JSONPacket& request) {
+  requireBranchStatesOnly(request.getJson());
   const qf::zero::Model asked = qf::zero::Model::create();
   const protocol::History theirs = protocol::History::unpackBranches(request.getJson(), asked);
   const qf::zero::Model& model = self.getModel();

@@ -1,88 +1,9 @@
 // Repositories over a packet transport: a bare repository served to clients that reach it
 // through remote proxies, over in-process channels.
-#include "kiv/metamodel/protocol/history_impl.h"
-#include "kiv/metamodel/remote_repository_impl.h"
-#include "kiv/protocol/repository_server.h"
-#include "kiv/repository/packet_answers.h"
-#include "kiv/repository/repository_fixture.h"
-#include "qf/zero/io/in_process_channel.h"
-#include "qf/zero/io/packet_transport.h"
-#include "qf/zero/io/websocket_channel.h"
-
-#include <functional>
+#include "kiv/protocol/network_fixture.h"
 
 namespace repository_test {
 namespace {
-
-using kiv::protocol::RepositoryServer;
-using qf::zero::io::InProcessChannel;
-using qf::zero::io::JSONPacket;
-using qf::zero::io::PacketTransport;
-
-// A client: its own repository model holding the origin's proxy and its clone, and a
-// user model bound to the clone's workspace.
-struct RemoteClone {
-  Model repositories = Model::create();
-  Model user = Model::create();
-  kiv::RemoteRepository origin;
-  kiv::LocalRepository repository;
-  kiv::Workspace workspace;
-
-  kiv::Commit tip() const { return repository->getHead()->getTip(); }
-};
-
-class OverTheNetwork : public ::testing::Test {
- protected:
-  OverTheNetwork() {
-    kiv::MetaPackageKiv::getInstance();
-    served = kiv::LocalRepository::create(serverModel, serverUser);
-    served->init(kiv::RepoType::Bare);
-    server = std::make_unique<RepositoryServer>(served);
-  }
-
-  std::shared_ptr<qf::zero::io::SynchronizationChannel> connectToServer() {
-    auto [mine, theirs] = InProcessChannel::createPair();
-    server->addConnection(theirs);
-    return mine;
-  }
-
-  // A WebSocket connection to the server over loopback, through a listener made on first use.
-  std::shared_ptr<qf::zero::io::SynchronizationChannel> connectOverLoopback() {
-    if (!listener) {
-      listener = std::make_unique<qf::zero::io::WebSocketListener>(
-          "127.0.0.1", 0, [this](std::shared_ptr<qf::zero::io::SynchronizationChannel> channel) {
-            server->addConnection(std::move(channel));
-          });
-    }
-    return qf::zero::io::WebSocketChannel::connect("127.0.0.1", listener->getPort());
-  }
-
-  RemoteClone cloneServed(bool overLoopback = false) {
-    RemoteClone clone;
-    {
-      qf::zero::Transaction transaction = clone.repositories->beginTransaction();
-      clone.origin = kiv::RemoteRepository::create(clone.repositories);
-      transaction.commit();
-    }
-    clone.origin->setSynchronizationChannel(overLoopback ? connectOverLoopback() : connectToServer());
-    clone.repository = clone.origin->synchronousClone(kiv::RepoType::Regular);
-    clone.workspace = clone.repository->getWorkspace(clone.user);
-    kiv::loadContext(clone.workspace);
-    return clone;
-  }
-
-  ModelElement addNode(RemoteClone& clone, const std::u16string& name) { return addNodeTo(tm, clone, name); }
-
-  // What the served repository holds, read while no request is in flight.
-  std::string servedDump() const { return dumpOf(serverModel); }
-
-  support::TestMetamodel tm;
-  Model serverModel = Model::create();
-  Model serverUser = Model::create();
-  kiv::LocalRepository served;
-  std::unique_ptr<RepositoryServer> server;
-  std::unique_ptr<qf::zero::io::WebSocketListener> listener;  // closed before the server goes
-};
 
 TEST_F(OverTheNetwork, ClientsCloneEditPushMergeAndPullUntilTheyAgree) {
   RemoteClone a = cloneServed();
@@ -325,114 +246,20 @@ const std::vector<BadReply> badReplies = {
     {"HistoryWithoutAHistory", "Pull",
      JSONPacket("History", {{"version", "1.0"}, {"entries", JsonValue::array()}}), pullObjects,
      "MalformedHistory"},
+    {"HistoryWithAStorageOfNoEntry", "Pull",
+     JSONPacket(
+         "History",
+         {{"version", "1.0"},
+          {"entries",
+           JsonValue::array(
+               {{{"type", "kiv.ObjectStorage"},
+                 {"id", "0b2c5a9e-3f1d-4c2b-9a8e-7d6c5b4a3f21"},
+                 {"content", {{"elementUUID", "5d0f7a4e-1c2b-4e3d-8f9a-0b1c2d3e4f50"}, {"content", 5}}}}})}}),
+     pullObjects, "MalformedHistory"},
 };
 
 using repository_test::PrintTo;
 INSTANTIATE_TEST_SUITE_P(Replies, BadServer, ::testing::ValuesIn(badReplies), CaseName());
-
-// A peer that speaks the protocol badly: every request is answered, nothing changes,
-// and the server goes on serving others.
-struct HostileRequest {
-  std::string name;
-  std::string type;
-  std::function<void(JsonValue&)> spoil;  // applied to a well-formed push of two commits
-  std::string messageId;                  // of the "Error" reply: "catalog/key"
-};
-
-class HostilePeer : public OverTheNetwork, public ::testing::WithParamInterface<HostileRequest> {};
-
-// The entry of `document` whose type is `type`, the first one.
-JsonValue& entryOfType(JsonValue& document, const std::string& type) {
-  for (JsonValue& entry : document["entries"]) {
-    if (entry["type"] == type) return entry;
-  }
-  throw std::runtime_error("no entry of type " + type);
-}
-
-TEST_P(HostilePeer, GetsAnErrorAndTheServerKeepsServing) {
-  const HostileRequest& row = GetParam();
-  RemoteClone a = cloneServed();
-  addNode(a, u"one");
-  addNode(a, u"two");
-  kiv::protocol::History push;
-  {
-    qf::zero::Transaction transaction = a.repositories->beginTransaction();
-    push = kiv::protocol::History::create(a.repositories);
-    push->getPreviousMutable().add(a.origin->getBranches().container().at(u"master"));
-    push->getCurrentMutable().add(a.repository->getHead());
-    transaction.commit();
-  }
-  JsonValue body = push.pack();
-  row.spoil(body);
-
-  PacketTransport peer(connectToServer());
-  const std::string before = servedDump();
-  const JSONPacket reply =
-      peer.sendAndExpectPacket(JSONPacket(row.type, body), "OK", std::chrono::seconds(30));
-  EXPECT_EQ(reply.getType(), "Error") << reply.getJson().dump();
-  EXPECT_EQ(reply.getJson().value("messageId", ""), row.messageId) << reply.getJson().dump();
-  EXPECT_EQ(servedDump(), before);
-
-  RemoteClone b = cloneServed();
-  addNode(b, u"b");
-  EXPECT_TRUE(completes(b.workspace->push(kiv::PushMode::TryPush))) << "the server still takes pushes";
-}
-
-const std::string push = "Push";
-const std::vector<HostileRequest> hostileRequests = {
-    {"NotADocument", push,
-     [](JsonValue& body) {
-       body = JsonValue::array({1, 2});
-     },
-     "qf0:messages/MalformedDocument"},
-    {"EntriesNotAnArray", push, [](JsonValue& body) { body["entries"] = "none"; },
-     "qf0:messages/MalformedDocument"},
-    {"UnknownElementType", push,
-     [](JsonValue& body) { entryOfType(body, "kiv.Commit")["type"] = "kiv.Nothing"; },
-     "qf0:messages/NoSuchClass"},
-    {"ForeignElementType", push,
-     [](JsonValue& body) { entryOfType(body, "kiv.Commit")["type"] = "kiv.LocalRepository"; },
-     "kiv:messages/MalformedHistory"},
-    {"ElementIdTwice", push,
-     [](JsonValue& body) { body["entries"].push_back(entryOfType(body, "kiv.ObjectStorage")); },
-     "qf0:messages/DuplicateElementId"},
-    {"WrongJsonType", push,
-     [](JsonValue& body) { entryOfType(body, "kiv.Commit")["content"]["parents"] = 7; },
-     "qf0:messages/WrongJsonType"},
-    {"ParentNeitherCarriedNorKnown", push,
-     [](JsonValue& body) {
-       entryOfType(body, "kiv.Commit")["content"]["parents"] =
-           JsonValue::array({"0b2c5a9e-3f1d-4c2b-9a8e-7d6c5b4a3f21"});
-     },
-     "qf0:messages/DanglingReference"},
-    {"DeltaNotCarried", push,
-     [](JsonValue& body) {
-       auto& entries = body["entries"];
-       for (auto it = entries.begin(); it != entries.end(); ++it) {
-         if ((*it)["type"] == "kiv.Delta") {
-           entries.erase(it);
-           return;
-         }
-       }
-     },
-     "qf0:messages/DanglingReference"},
-    {"CyclicParents", push,
-     [](JsonValue& body) {
-       std::vector<JsonValue*> commits;
-       for (JsonValue& entry : body["entries"]) {
-         if (entry["type"] == "kiv.Commit") commits.push_back(&entry);
-       }
-       ASSERT_GE(commits.size(), 2u);
-       (*commits[0])["content"]["parents"] = JsonValue::array({(*commits[1])["id"]});
-       (*commits[1])["content"]["parents"] = JsonValue::array({(*commits[0])["id"]});
-     },
-     "kiv:messages/MalformedHistory"},
-    {"PullWithNonsense", "Pull", [](JsonValue& body) { body = "nonsense"; },
-     "qf0:messages/MalformedDocument"},
-};
-
-using repository_test::PrintTo;
-INSTANTIATE_TEST_SUITE_P(Requests, HostilePeer, ::testing::ValuesIn(hostileRequests), CaseName());
 
 }  // namespace
 }  // namespace repository_test

@@ -13,6 +13,11 @@
 
 namespace kiv {
 
+// Raises "MalformedPacket" unless the request's body is null, as it is for "PullInfo",
+// "AddRemoteObserver" and "RemoveRemoteObserver": a peer that sends anything else there does
+// not speak this protocol, and is told so rather than answered as if it did.
+void requireNullBody(const qf::zero::io::JSONPacket& request);
+
 // "RepoInfo": {"isBare": <boolean>, "head": <name of the head branch, "" for none>}.
 qf::zero::io::JSONPacket answerPullInfo(const LocalRepository& served);
 
