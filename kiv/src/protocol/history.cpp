@@ -4,6 +4,7 @@
 #include "kiv/metamodel/delta_impl.h"
 #include "kiv/metamodel/protocol/history_impl.h"
 #include "kiv/protocol/aggregate_customizer.h"
+#include "kiv/protocol/history_text.h"
 #include "kiv/protocol/terminator_model_builder.h"
 #include "protocol/history_checks.h"
 #include "qf/zero/core/messages.h"
@@ -88,6 +89,14 @@ class HistoryParseCustomizer : public qf::zero::io::ParseCustomizer {
   int histories_ = 0;
 };
 
+// Whether a set of the history holds `wanted` and nothing else.
+template <class Collection, class Element>
+bool holdsExactly(const Collection& collection, const std::unordered_set<Element>& wanted) {
+  if (collection.size() != wanted.size()) return false;
+  const auto& held = collection.container();
+  return std::all_of(wanted.begin(), wanted.end(), [&](const Element& element) { return held.count(element) != 0; });
+}
+
 template <class Element>
 std::vector<Element> sortedByUuid(std::vector<Element> elements) {
   std::sort(elements.begin(), elements.end(),
@@ -124,6 +133,7 @@ void History::Impl::resolveCommits() {
   }
   std::unordered_set<Commit> between;
   Commit::Impl::selectInRange(before, after, between);
+  if (holdsExactly(commits_, between)) return;
   qf::zero::Transaction transaction = beginOn(*this);
   getCommitsMutable().clear();
   for (const Commit& commit : sortedByUuid(std::vector<Commit>(between.begin(), between.end()))) {
@@ -132,30 +142,56 @@ void History::Impl::resolveCommits() {
   transaction.commit();
 }
 
-qf::zero::JsonValue History::Impl::pack() {
-  resolveCommits();
-  qf::zero::Transaction transaction = beginOn(*this);
-  getObjectStoragesMutable().clear();
-  getDeltasMutable().clear();
+namespace {
+
+// Resolves the commits, then fills the delta and storage sets: each delta and storage the
+// commits name, once.
+void gatherForPacking(History::Impl& history) {
+  history.resolveCommits();
+  std::vector<Delta> deltaOrder;
+  std::vector<ObjectStorage> storageOrder;
   std::unordered_set<Delta> deltas;
   std::unordered_set<ObjectStorage> storages;
-  for (const Commit& commit : commits_.container()) {
+  for (const Commit& commit : history.getCommits().container()) {
     const Delta delta = isPresent(commit) ? commit->getDelta() : Delta();
     if (!isPresent(delta) || !deltas.insert(delta).second) continue;
-    getDeltasMutable().add(delta);
+    deltaOrder.push_back(delta);
     for (const auto* side : {&delta->getPrevious().container(), &delta->getCurrent().container()}) {
       for (const auto& [uuid, storage] : *side) {
-        if (isPresent(storage) && storages.insert(storage).second) getObjectStoragesMutable().add(storage);
+        if (isPresent(storage) && storages.insert(storage).second) storageOrder.push_back(storage);
       }
     }
   }
+  // Packing the same history again changes nothing.
+  if (holdsExactly(history.getDeltas(), deltas) && holdsExactly(history.getObjectStorages(), storages)) return;
+  qf::zero::Transaction transaction = beginOn(history);
+  history.getObjectStoragesMutable().clear();
+  history.getDeltasMutable().clear();
+  for (const Delta& delta : deltaOrder) history.getDeltasMutable().add(delta);
+  for (const ObjectStorage& storage : storageOrder) history.getObjectStoragesMutable().add(storage);
   transaction.commit();
+}
+
+void writePacked(History::Impl& history, const qf::zero::io::SerializationOutput& output) {
+  gatherForPacking(history);
   qf::zero::io::JSONSerializer serializer(std::make_unique<qf::zero::io::JSONModelTraverser>(),
                                           std::make_unique<AggregateCustomizer>());
+  serializer.serialize(ModelElement(&history), output);
+}
+
+}  // namespace
+
+qf::zero::JsonValue History::Impl::pack() {
   qf::zero::JsonValue document;
-  serializer.serialize(ModelElement(this),
-                       qf::zero::io::SerializationOutput::forIntermediateFormat(&document));
+  writePacked(*this, qf::zero::io::SerializationOutput::forIntermediateFormat(&document));
   return document;
+}
+
+std::string packAsText(const History& history) {
+  if (!history) qf::zero::reportException(qf0::messages::ElementRequired(u"kiv.protocol.packAsText"));
+  std::string text;
+  writePacked(*history.getImpl(), qf::zero::io::SerializationOutput::forText(&text));
+  return text;
 }
 
 void History::Impl::clear() {

@@ -1,5 +1,6 @@
 // Histories as packets: what a packed history carries, and what unpacking gives back.
 #include "kiv/metamodel/protocol/history_impl.h"
+#include "kiv/protocol/history_text.h"
 #include "kiv/repository/repository_fixture.h"
 
 #include <set>
@@ -65,6 +66,22 @@ TEST_F(HistoryPackets, PackCarriesTheCommitsBetweenTheStatesWithTheirDeltasAndEa
   EXPECT_EQ(document["entries"].size(), 1 + 2 + 3 + 3 + storages.size())
       << "the history, two branches, and every commit, delta and storage once";
   EXPECT_EQ(history.pack(), document) << "equal histories give identical documents";
+}
+
+// Written as text, a packed history is its document's dump: made, renamed and destroyed
+// elements, a whole-state commit, and an empty history.
+TEST_F(HistoryPackets, PackedAsTextAHistoryIsItsDocumentsDump) {
+  const kiv::protocol::History empty = historyOfClone();
+  EXPECT_EQ(kiv::protocol::packAsText(empty), empty.pack().dump());
+  ModelElement node = addNode(clone, u"a");
+  addNode(clone, u"b \u00e9\"\n");
+  rename(clone, node, u"c");
+  clone.workspace->commitTransaction([&] { node.destroy(); });
+  clone.workspace->takeSnapshot();
+  const kiv::protocol::History history = historyOfClone();
+  const std::string text = kiv::protocol::packAsText(history);
+  EXPECT_EQ(text, history.pack().dump());
+  EXPECT_GT(history.getObjectStorages().size(), 3u);
 }
 
 TEST_F(HistoryPackets, EqualStatesPackNothingBetweenThem) {

@@ -211,6 +211,8 @@ def _impl_class(d, cls):
               f"  {QZ}::Value basicGetValue(const {QZ}::meta::Property& property) const override;",
               f"  void basicSetValue(const {QZ}::meta::Property& property, const {QZ}::Value& value) override;",
               f"  {QZ}::AbstractOwnedCollection* basicGetCollection(const {QZ}::meta::Property& property) const override;",
+              *([f"  const {QZ}::JsonText* basicGetHeldText(const {QZ}::meta::Property& property) const override;"]
+                if any(p.held_as_text for p in raw) else []),
               f"  std::unique_ptr<{QZ}::ModelElement::Impl::Storage> createStorage() const override;",
               f"  void copyValue({QZ}::ModelElement::Impl::Storage* storage, int index) const override;",
               f"  void restoreFromStorage({QZ}::ModelElement::Impl::Storage* storage, bool collections) override;"]

@@ -60,6 +60,11 @@ def reflection_source(d, cls):
     lines += _dispatch(d, cls, single, lambda p: [f"basicSet{p.cap}(value.getValue<{value_type(p.type) if p.held_as_text else member_type(p)}>());", "return;"],
                        ("  (void)value;\n" if cls.superclass is None else "")
                        + _no_such_property(cls, "basicSetValue(property, value)").replace("  return ", "  "))
+    held = [p for p in single if p.held_as_text]
+    if held:
+        lines += ["}", "", f"const {QZ}::JsonText* {n}::Impl::basicGetHeldText(const {QZ}::meta::Property& property) const {{"]
+        lines += _dispatch(d, cls, held, lambda p: [f"return &{member(p)};"],
+                           f"  return {base}::basicGetHeldText(property);")
     lines += ["}", "",
               f"{QZ}::AbstractOwnedCollection* {n}::Impl::basicGetCollection(const {QZ}::meta::Property& property) const {{"]
     lines += _dispatch(d, cls, many, lambda p: [f"return const_cast<{p.cap}Collection*>(&{member(p)});"],

@@ -620,4 +620,6 @@ Value ModelElement::invoke(const meta::Operation& operation, std::vector<Value> 
 }
 void ModelElement::destroy() { impl_->destroy(); }
 
+const JsonText* ModelElement::Impl::basicGetHeldText(const meta::Property&) const { return nullptr; }
+
 }  // namespace qf::zero

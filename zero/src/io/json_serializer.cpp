@@ -1,6 +1,7 @@
 #include "qf/zero/io/json_serializer.h"
 
 #include "attribute_codec.h"
+#include "qf/zero/core/json_text.h"
 #include "qf/zero/core/meta/framework_package.h"
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/primitive_collection.h"
@@ -12,6 +13,8 @@
 #include <nlohmann/json.hpp>
 
 #include <algorithm>
+#include <optional>
+#include <string>
 #include <unordered_map>
 #include <unordered_set>
 
@@ -32,6 +35,38 @@ ordered_json referencesJson(const ReferenceCollection& collection, bool ordered)
   ordered_json array = ordered_json::array();
   for (const ModelElement& target : targets) array.push_back(uuidJson(target));
   return array;
+}
+
+// A UUID's text in quotes, as dump() writes it, without the string and escaping work: the
+// text is hex digits and dashes only.
+void appendQuotedUuid(std::string& out, const Uuid& id) {
+  static constexpr char digits[] = "0123456789abcdef";
+  char text[38];
+  std::size_t at = 0;
+  text[at++] = '"';
+  for (std::size_t i = 0; i < 16; ++i) {
+    if (i == 4 || i == 6 || i == 8 || i == 10) text[at++] = '-';
+    const auto byte = static_cast<unsigned char>(id.data[i]);
+    text[at++] = digits[byte >> 4];
+    text[at++] = digits[byte & 0x0f];
+  }
+  text[at++] = '"';
+  out.append(text, at);
+}
+
+// A reference property as text: what referencesJson or uuidJson would give, dumped.
+void appendReferences(std::string& out, const ReferenceCollection& collection, bool ordered) {
+  std::vector<ModelElement> targets = collection.getAllValuesAndProxies();
+  if (!ordered) {
+    std::sort(targets.begin(), targets.end(),
+              [](const ModelElement& a, const ModelElement& b) { return a.getUuid() < b.getUuid(); });
+  }
+  out += '[';
+  for (std::size_t i = 0; i < targets.size(); ++i) {
+    if (i > 0) out += ',';
+    appendQuotedUuid(out, targets[i].getUuid());
+  }
+  out += ']';
 }
 
 // A value that does not say which property it belongs to, written by what it holds.
@@ -83,6 +118,42 @@ class JSONSerializer::EntryWriter {
     return entry;
   }
 
+  // Appends the text of write(element).dump() to `out`; a value held as text is copied.
+  void writeText(const ModelElement& element, std::string& out) {
+    const ClassPlan& plan = planFor(element.getMetaClass());
+    out += plan.entryStart;
+    appendQuotedUuid(out, element.getUuid());
+    out += R"(,"content":{)";
+    const ModelElement::Impl& impl = *element.getImpl();
+    const bool skipDefaults = customizer_.shouldSkipDefaultValues();
+    bool first = true;
+    ordered_json scratch = ordered_json::object();
+    for (const PropertyPlan& property : plan.properties) {
+      if (property.reference) {
+        if (writeReferenceText(impl, property, first, out)) first = false;
+        continue;
+      }
+      const JsonText* held = property.mayBeHeldAsText ? impl.basicGetHeldText(property.property) : nullptr;
+      if (held != nullptr) {
+        if (skipDefaults && property.defaultText && held->text() == *property.defaultText) continue;
+        out += first ? "" : ",";
+        out += property.key;
+        out += held->text();
+        first = false;
+        continue;
+      }
+      writeProperty(impl, property, scratch);
+      if (scratch.empty()) continue;
+      out += first ? "" : ",";
+      out += property.key;
+      out += scratch.begin()->dump();
+      scratch.clear();
+      first = false;
+    }
+    out += "}}";
+  }
+
+
  private:
   struct PropertyPlan {
     meta::Property property;
@@ -90,9 +161,13 @@ class JSONSerializer::EntryWriter {
     bool reference;
     internal::AttributeCodec codec;
     Value defaultValue;
+    std::string key;                        // "<name>": as written in text
+    bool mayBeHeldAsText = false;           // a single JsonValue
+    std::optional<std::string> defaultText;  // the default of such a property, as text
   };
   struct ClassPlan {
     std::string typeName;
+    std::string entryStart;  // {"type":"<typeName>","id":
     std::vector<PropertyPlan> properties;
   };
 
@@ -100,12 +175,21 @@ class JSONSerializer::EntryWriter {
     if (auto it = plans_.find(metaClass.getImpl()); it != plans_.end()) return it->second;
     ClassPlan plan;
     plan.typeName = toUtf8(metaClass.getQualifiedName());
+    plan.entryStart = std::string("{\"") + JSONConstants::TYPE_ATTR + "\":" + ordered_json(plan.typeName).dump() +
+                      ",\"" + JSONConstants::ID_ATTR + "\":";
     for (const meta::Property& property : traverser_.getProperties(metaClass, PropertyCategory::All)) {
-      PropertyPlan entry{property, toUtf8(property.getName()), property->isReference(), {}, {}};
+      PropertyPlan entry{property, toUtf8(property.getName()), property->isReference(), {}, {}, {}, false, {}};
+      entry.key = ordered_json(entry.name).dump() + ":";
       if (!entry.reference) {
         entry.codec = internal::codecFor(property->getType());
         if (entry.codec.kind == internal::AttributeKind::Opaque) continue;
         if (!property->isMany()) entry.defaultValue = property->getDefaultValue();
+        if (!property->isMany() && entry.codec.kind == internal::AttributeKind::Json) {
+          entry.mayBeHeldAsText = true;
+          if (!entry.defaultValue.isEmpty()) {
+            entry.defaultText = internal::writeAttribute(property, entry.codec, entry.defaultValue).dump();
+          }
+        }
       }
       plan.properties.push_back(std::move(entry));
     }
@@ -140,6 +224,31 @@ class JSONSerializer::EntryWriter {
     }
     if (skipDefaults && (value.isEmpty() || value == plan.defaultValue)) return;
     content[plan.name] = internal::writeAttribute(property, plan.codec, value);
+  }
+
+  // writeProperty for a reference, as text; false when skipped as a default.
+  bool writeReferenceText(const ModelElement::Impl& element, const PropertyPlan& plan, bool first,
+                          std::string& out) const {
+    const meta::Property& property = plan.property;
+    const bool skipDefaults = customizer_.shouldSkipDefaultValues();
+    if (property->isMany()) {
+      auto* collection = static_cast<ReferenceCollection*>(element.basicGetCollection(property));
+      if (skipDefaults && collection->size() == 0) return false;
+      out += first ? "" : ",";
+      out += plan.key;
+      appendReferences(out, *collection, property->isSequence());
+      return true;
+    }
+    const Value value = element.basicGetValue(property);
+    if (skipDefaults && value.isEmpty()) return false;
+    out += first ? "" : ",";
+    out += plan.key;
+    if (value.isElement()) {
+      appendQuotedUuid(out, value.getElement().getUuid());
+    } else {
+      out += "null";
+    }
+    return true;
   }
 
   ModelTraverser& traverser_;
@@ -177,39 +286,57 @@ void JSONSerializer::serialize(const ModelElement& element, const SerializationO
 }
 
 void JSONSerializer::serialize(const std::vector<ModelElement>& elements, const SerializationOutput& output) {
-  ordered_json document = newDocument();
-  ordered_json& entries = document[JSONConstants::ENTRIES_ATTR];
+  std::vector<ModelElement> order;
   std::unordered_set<ModelElement> written;
   std::vector<ModelElement> pending;
   for (const ModelElement& root : elements) {
     pending.push_back(root);
     while (!pending.empty()) {
-      const ModelElement element = std::move(pending.back());
+      ModelElement element = std::move(pending.back());
       pending.pop_back();
       if (!element || !written.insert(element).second) continue;
-      entries.push_back(writer_->write(element));
       std::vector<ModelElement> members = customizer_->getAggregateMembers(element);
       pending.insert(pending.end(), members.rbegin(), members.rend());
+      order.push_back(std::move(element));
     }
   }
-  emit(std::move(document), output);
+  emitEntries(order, output);
 }
 
 void JSONSerializer::serialize(const Model& model, const SerializationOutput& output) {
-  ordered_json document = newDocument();
-  ordered_json& entries = document[JSONConstants::ENTRIES_ATTR];
+  std::vector<ModelElement> order;
   const ContainmentAggregateCustomizer containment;
   std::vector<ModelElement> pending;
   for (const ModelElement& top : model->getTopLevelElements()) {
     pending.push_back(top);
     while (!pending.empty()) {
-      const ModelElement element = std::move(pending.back());
+      ModelElement element = std::move(pending.back());
       pending.pop_back();
-      entries.push_back(writer_->write(element));
       std::vector<ModelElement> children = containment.getAggregateMembers(element);
       pending.insert(pending.end(), children.rbegin(), children.rend());
+      order.push_back(std::move(element));
     }
   }
+  emitEntries(order, output);
+}
+
+void JSONSerializer::emitEntries(const std::vector<ModelElement>& elements, const SerializationOutput& output) {
+  if (output.getJson() == nullptr && output.getText() != nullptr) {
+    std::string& text = *output.getText();
+    text.clear();
+    text += std::string("{\"") + JSONConstants::VERSION_ATTR + "\":" + ordered_json(customizer_->getFormatVersion()).dump() +
+            ",\"" + JSONConstants::ENTRIES_ATTR + "\":[";
+    for (std::size_t i = 0; i < elements.size(); ++i) {
+      if (i > 0) text += ',';
+      writer_->writeText(elements[i], text);
+    }
+    text += "]}";
+    return;
+  }
+  ordered_json document = newDocument();
+  ordered_json& entries = document[JSONConstants::ENTRIES_ATTR];
+  entries.get_ref<ordered_json::array_t&>().reserve(elements.size());
+  for (const ModelElement& element : elements) entries.push_back(writer_->write(element));
   emit(std::move(document), output);
 }
 

@@ -8,6 +8,7 @@ class ModelImpl;
 class ModelElement;
 class Transaction;
 class Value;
+class JsonText;
 class ValueMeta;
 class AbstractOwnedCollection;
 class ReferenceCollection;

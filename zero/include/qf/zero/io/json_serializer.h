@@ -6,6 +6,10 @@
 // The document layout is described in json_constants.h. Many-valued properties keep
 // their order when ordered; sets and maps are written sorted (references by UUID,
 // values by their JSON form) so that equal models give identical documents.
+//
+// Written as text (SerializationOutput::forText), a document is the same text as the dump of
+// its intermediate form, but made without building that form: entries are written one by
+// one, and a JsonValue property that an element keeps as text is copied as it is.
 #pragma once
 
 #include "qf/zero/core/model.h"
@@ -57,6 +61,8 @@ class JSONSerializer final : public Serializer {
  private:
   class EntryWriter;
   void emit(nlohmann::ordered_json&& document, const SerializationOutput& output) const;
+  // A document of these elements' entries, in order.
+  void emitEntries(const std::vector<ModelElement>& elements, const SerializationOutput& output);
   nlohmann::ordered_json newDocument() const;
 
   std::unique_ptr<ModelTraverser> traverser_;

@@ -135,6 +135,10 @@ class ModelElement::Impl : public RefCounted {
   virtual void basicSetValue(const meta::Property& property, const Value& value) = 0;
   // A many-valued property: its collection (never null for a many-valued property).
   virtual AbstractOwnedCollection* basicGetCollection(const meta::Property& property) const = 0;
+  // A single JsonValue property that the element keeps as compact text: that text, so that a
+  // writer of text copies it instead of parsing and writing it again. Null for any other
+  // property (the default).
+  virtual const JsonText* basicGetHeldText(const meta::Property& property) const;
   // Every property of the class (inherited first), in index order.
   const std::vector<meta::Property>& allProperties() const;
 
