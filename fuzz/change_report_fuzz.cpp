@@ -12,6 +12,7 @@
 #include "support/test_metamodel.h"
 
 #include <gtest/gtest.h>
+
 #include <nlohmann/json.hpp>
 
 #include <cstddef>

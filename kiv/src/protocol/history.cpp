@@ -94,7 +94,8 @@ template <class Collection, class Element>
 bool holdsExactly(const Collection& collection, const std::unordered_set<Element>& wanted) {
   if (collection.size() != wanted.size()) return false;
   const auto& held = collection.container();
-  return std::all_of(wanted.begin(), wanted.end(), [&](const Element& element) { return held.count(element) != 0; });
+  return std::all_of(wanted.begin(), wanted.end(),
+                     [&](const Element& element) { return held.count(element) != 0; });
 }
 
 template <class Element>
@@ -163,7 +164,8 @@ void gatherForPacking(History::Impl& history) {
     }
   }
   // Packing the same history again changes nothing.
-  if (holdsExactly(history.getDeltas(), deltas) && holdsExactly(history.getObjectStorages(), storages)) return;
+  if (holdsExactly(history.getDeltas(), deltas) && holdsExactly(history.getObjectStorages(), storages))
+    return;
   qf::zero::Transaction transaction = beginOn(history);
   history.getObjectStoragesMutable().clear();
   history.getDeltasMutable().clear();

@@ -68,13 +68,11 @@ class JSONParser::Run {
     if (!json.is_object()) malformed(entryLabel(index) + " is not an object");
     const auto type = json.find(JSONConstants::TYPE_ATTR);
     if (type == json.end() || !type->is_string()) malformed(entryLabel(index) + " has no type name");
-    const std::u16string typeName = toUtf16(type->get_ref<const std::string&>());
-    const meta::Class metaClass = customizer_.getMetaClass(typeName);
-    if (!metaClass) reportException(msg::NoSuchClass(typeName));
+    const meta::Class metaClass = classNamed(type->get_ref<const std::string&>());
 
     ElementId id;
     if (const auto idJson = json.find(JSONConstants::ID_ATTR); idJson != json.end() && !idJson->is_null()) {
-      id.uuid = readUuid(*idJson, entryLabel(index));
+      id.uuid = readUuid(*idJson, [&] { return entryLabel(index); });
       if (byUuid_.count(*id.uuid) != 0) reportException(msg::DuplicateElementId(toText(*id.uuid)));
     }
     const ordered_json* content = nullptr;
@@ -92,11 +90,23 @@ class JSONParser::Run {
     entries_.push_back(Entry{index, std::move(element), metaClass, content});
   }
 
-  static Uuid readUuid(const ordered_json& json, const std::string& where) {
+  // `where` names the place for the error only: it is not called for a good UUID, which is
+  // nearly every time, and saying where costs strings.
+  template <class Where>
+  static Uuid readUuid(const ordered_json& json, const Where& where) {
     if (json.is_string()) {
       if (auto uuid = parseUuid(json.get_ref<const std::string&>())) return *uuid;
     }
-    malformed(where + ": " + json.dump() + " is not a UUID");
+    malformed(where() + ": " + json.dump() + " is not a UUID");
+  }
+
+  // The class of a type name, asked of the customizer once per name and parse.
+  meta::Class classNamed(const std::string& name) {
+    if (auto it = classes_.find(name); it != classes_.end()) return it->second;
+    const std::u16string typeName = toUtf16(name);
+    const meta::Class metaClass = customizer_.getMetaClass(typeName);
+    if (!metaClass) reportException(msg::NoSuchClass(typeName));
+    return classes_.emplace(name, metaClass).first->second;
   }
 
   const PropertyPlan& planFor(const Entry& entry, const std::string& member) {
@@ -243,7 +253,7 @@ class JSONParser::Run {
   // customizer finds. Null only for a reference to a skipped entry.
   ModelElement resolve(const meta::Property& property, const ordered_json& json) {
     if (!json.is_string()) wrongType(property, "a UUID string", json);
-    const Uuid uuid = readUuid(json, toUtf8(property.getQualifiedName()));
+    const Uuid uuid = readUuid(json, [&] { return toUtf8(property.getQualifiedName()); });
     if (auto it = byUuid_.find(uuid); it != byUuid_.end() && it->second) return it->second;
     const auto targetClass = elementCast<meta::Class>(ModelElement(property->getType()));
     ModelElement found = customizer_.findReference(builder_, model_, targetClass, ElementId{uuid});
@@ -262,6 +272,7 @@ class JSONParser::Run {
 
   ParseCustomizer& customizer_;
   ModelBuilder& builder_;
+  std::unordered_map<std::string, meta::Class> classes_;
   Model model_;
   std::vector<Entry> entries_;
   std::unordered_map<Uuid, ModelElement, boost::hash<Uuid>> byUuid_;

@@ -153,7 +153,6 @@ class JSONSerializer::EntryWriter {
     out += "}}";
   }
 
-
  private:
   struct PropertyPlan {
     meta::Property property;
@@ -161,8 +160,8 @@ class JSONSerializer::EntryWriter {
     bool reference;
     internal::AttributeCodec codec;
     Value defaultValue;
-    std::string key;                        // "<name>": as written in text
-    bool mayBeHeldAsText = false;           // a single JsonValue
+    std::string key;                         // "<name>": as written in text
+    bool mayBeHeldAsText = false;            // a single JsonValue
     std::optional<std::string> defaultText;  // the default of such a property, as text
   };
   struct ClassPlan {
@@ -175,10 +174,11 @@ class JSONSerializer::EntryWriter {
     if (auto it = plans_.find(metaClass.getImpl()); it != plans_.end()) return it->second;
     ClassPlan plan;
     plan.typeName = toUtf8(metaClass.getQualifiedName());
-    plan.entryStart = std::string("{\"") + JSONConstants::TYPE_ATTR + "\":" + ordered_json(plan.typeName).dump() +
-                      ",\"" + JSONConstants::ID_ATTR + "\":";
+    plan.entryStart = std::string("{\"") + JSONConstants::TYPE_ATTR +
+                      "\":" + ordered_json(plan.typeName).dump() + ",\"" + JSONConstants::ID_ATTR + "\":";
     for (const meta::Property& property : traverser_.getProperties(metaClass, PropertyCategory::All)) {
-      PropertyPlan entry{property, toUtf8(property.getName()), property->isReference(), {}, {}, {}, false, {}};
+      PropertyPlan entry{property, toUtf8(property.getName()), property->isReference(), {}, {}, {}, false,
+                         {}};
       entry.key = ordered_json(entry.name).dump() + ":";
       if (!entry.reference) {
         entry.codec = internal::codecFor(property->getType());
@@ -320,12 +320,14 @@ void JSONSerializer::serialize(const Model& model, const SerializationOutput& ou
   emitEntries(order, output);
 }
 
-void JSONSerializer::emitEntries(const std::vector<ModelElement>& elements, const SerializationOutput& output) {
+void JSONSerializer::emitEntries(const std::vector<ModelElement>& elements,
+                                 const SerializationOutput& output) {
   if (output.getJson() == nullptr && output.getText() != nullptr) {
     std::string& text = *output.getText();
     text.clear();
-    text += std::string("{\"") + JSONConstants::VERSION_ATTR + "\":" + ordered_json(customizer_->getFormatVersion()).dump() +
-            ",\"" + JSONConstants::ENTRIES_ATTR + "\":[";
+    text += std::string("{\"") + JSONConstants::VERSION_ATTR +
+            "\":" + ordered_json(customizer_->getFormatVersion()).dump() + ",\"" +
+            JSONConstants::ENTRIES_ATTR + "\":[";
     for (std::size_t i = 0; i < elements.size(); ++i) {
       if (i > 0) text += ',';
       writer_->writeText(elements[i], text);
