@@ -26,14 +26,21 @@ namespace {
 
 ordered_json uuidJson(const ModelElement& element) { return element.identifier(); }
 
-ordered_json referencesJson(const ReferenceCollection& collection, bool ordered) {
+// The targets of a reference property in the order they are written: a sequence in its
+// order, a set or map sorted by UUID.
+std::vector<ModelElement> targetsInWrittenOrder(const ReferenceCollection& collection, bool ordered) {
   std::vector<ModelElement> targets = collection.getAllValuesAndProxies();
   if (!ordered) {
     std::sort(targets.begin(), targets.end(),
               [](const ModelElement& a, const ModelElement& b) { return a.getUuid() < b.getUuid(); });
   }
+  return targets;
+}
+
+ordered_json referencesJson(const ReferenceCollection& collection, bool ordered) {
   ordered_json array = ordered_json::array();
-  for (const ModelElement& target : targets) array.push_back(uuidJson(target));
+  for (const ModelElement& target : targetsInWrittenOrder(collection, ordered))
+    array.push_back(uuidJson(target));
   return array;
 }
 
@@ -56,11 +63,7 @@ void appendQuotedUuid(std::string& out, const Uuid& id) {
 
 // A reference property as text: what referencesJson or uuidJson would give, dumped.
 void appendReferences(std::string& out, const ReferenceCollection& collection, bool ordered) {
-  std::vector<ModelElement> targets = collection.getAllValuesAndProxies();
-  if (!ordered) {
-    std::sort(targets.begin(), targets.end(),
-              [](const ModelElement& a, const ModelElement& b) { return a.getUuid() < b.getUuid(); });
-  }
+  const std::vector<ModelElement> targets = targetsInWrittenOrder(collection, ordered);
   out += '[';
   for (std::size_t i = 0; i < targets.size(); ++i) {
     if (i > 0) out += ',';
