@@ -88,8 +88,11 @@ void checkStoredEntry(const qf::zero::JsonValue& storageEntry) {
       !properties->is_object()) {
     return;
   }
-  const auto elementUuid = properties->find("elementUUID");
-  const auto stored = properties->find("content");
+  const MetaPackageKiv& kiv = MetaPackageKiv::getInstance();
+  static const std::string elementUuidName = qf::zero::toUtf8(kiv.getObjectStorage_elementUUID().getName());
+  static const std::string contentName = qf::zero::toUtf8(kiv.getObjectStorage_content().getName());
+  const auto elementUuid = properties->find(elementUuidName);
+  const auto stored = properties->find(contentName);
   const bool namesElement = elementUuid != properties->end() && elementUuid->is_string() &&
                             !elementUuid->get_ref<const std::string&>().empty() &&
                             elementUuid->get_ref<const std::string&>() != qf::zero::toText(qf::zero::Uuid());
@@ -131,12 +134,13 @@ void checkReceivedHistory(const History& history) {
 void checkStorageEntries(const qf::zero::JsonValue& document) {
   using qf::zero::io::JSONConstants;
   if (!document.is_object()) return;
+  static const std::string storageClass = qf::zero::toUtf8(ObjectStorage::metaClass().getQualifiedName());
   const auto entries = document.find(JSONConstants::ENTRIES_ATTR);
   if (entries == document.end() || !entries->is_array()) return;
   for (const qf::zero::JsonValue& entry : *entries) {
     if (!entry.is_object()) continue;
     const auto type = entry.find(JSONConstants::TYPE_ATTR);
-    if (type != entry.end() && *type == "kiv.ObjectStorage") checkStoredEntry(entry);
+    if (type != entry.end() && *type == storageClass) checkStoredEntry(entry);
   }
 }
 
