@@ -1,19 +1,26 @@
 // The walks of a recorded history against its length and shape.
 //
 // Linear histories of 100, 1,000 and 10,000 commits over one small user model:
-//   - getSnapshot of the tip walks to the initial commit and composes every delta;
+//   - getSnapshot of the tip, asked again and again: the state kept for the tip (the first
+//     call composes every delta back to the initial commit);
 //   - diff of the tip against a commit 10 back (a short path) and against the initial
 //     commit (the whole history);
 //   - find of an element from the tip, for one last recorded in the initial commit (the
 //     walk spans the history) and one recorded by the tip itself (the walk stops at once).
-// The walks are linear in the number of commits they pass, so a snapshot or a diff to the
-// initial commit should grow tenfold from size to size while a diff 10 back stays flat.
+// The walks are linear in the number of commits they pass, so a diff to the initial commit
+// should grow tenfold from size to size while a diff 10 back and a snapshot stay flat.
 // The counter per_commit divides the time by the commits passed. Each commit here takes
 // about 4.5 KB of the repository model, so 10,000 of them outgrow the caches and every
 // commit passed then costs several times more: compare per_commit across sizes.
 //
+// Longer lines of 1,000, 10,000 and 100,000 commits: the snapshot of a new tip, and a merge
+// of two branches that left the line 10 commits ago, each costing the commits since a kept
+// state: flat in the length.
+//
 // A line with merges: findAllPaths keeps no visited set, so every merge of a side line
 // doubles the number of paths from the tip, and the time with it.
+#include "kiv/merge/default_merge_strategy.h"
+#include "kiv/merge/merge_strategy.h"
 #include "kiv/metamodel/commit_impl.h"
 #include "kiv/metamodel/delta_impl.h"
 #include "kiv/metamodel/object_storage_impl.h"
@@ -88,41 +95,45 @@ std::u16string itemName(std::size_t number) {
 class LinearHistory {
  public:
   explicit LinearHistory(std::size_t length) {
-    const ItemMetamodel& metamodel = itemMetamodel();
     const auto started = std::chrono::steady_clock::now();
-    std::size_t nextUpdated = 0;
     for (std::size_t index = 0; index < length; ++index) {
-      std::vector<ModelElement> created;
-      std::vector<ModelElement> updated;
-      {
-        Transaction edit = user_->beginTransaction();
-        if (index < kCreatingCommits) {
-          for (std::size_t i = 0; i < kCreatedPerCommit; ++i) {
-            ModelElement item = metamodel.item.instantiate(user_);
-            item.setPropertyValue(metamodel.name, Value::of(itemName(items_.size())));
-            items_.push_back(item);
-            created.push_back(item);
-          }
-        } else {
-          for (std::size_t i = 0; i < kUpdatedPerCommit; ++i) {
-            ModelElement& item = items_[1 + nextUpdated++ % (kItemCount - 1)];
-            item.setPropertyValue(metamodel.count, Value::of(static_cast<int>(index)));
-            updated.push_back(item);
-          }
-        }
-        edit.commit();
-      }
-      Transaction record = repository_->beginTransaction();
-      kiv::Commit commit = kiv::Commit::create(repository_);
-      if (!commits_.empty()) commit->addParent(commits_.back());
-      for (const ModelElement& item : created) commit->addCreated(item);
-      for (const ModelElement& item : updated) commit->addUpdated(item);
-      record.commit();
-      commits_.push_back(commit);
-      lastUpdated_ = updated;
+      commits_.push_back(record(commits_.empty() ? kiv::Commit() : commits_.back()));
     }
     const std::chrono::duration<double> took = std::chrono::steady_clock::now() - started;
     std::fprintf(stderr, "recorded a linear history of %zu commits in %.2f s\n", length, took.count());
+  }
+
+  // One more commit on `parent` (none: a new initial commit), changing the next items.
+  kiv::Commit record(const kiv::Commit& parent) {
+    const ItemMetamodel& metamodel = itemMetamodel();
+    std::vector<ModelElement> created;
+    std::vector<ModelElement> updated;
+    {
+      Transaction edit = user_->beginTransaction();
+      if (items_.size() < kItemCount) {
+        for (std::size_t i = 0; i < kCreatedPerCommit; ++i) {
+          ModelElement item = metamodel.item.instantiate(user_);
+          item.setPropertyValue(metamodel.name, Value::of(itemName(items_.size())));
+          items_.push_back(item);
+          created.push_back(item);
+        }
+      } else {
+        for (std::size_t i = 0; i < kUpdatedPerCommit; ++i) {
+          ModelElement& item = items_[1 + nextUpdated_++ % (kItemCount - 1)];
+          item.setPropertyValue(metamodel.count, Value::of(static_cast<int>(nextUpdated_)));
+          updated.push_back(item);
+        }
+      }
+      edit.commit();
+    }
+    Transaction record = repository_->beginTransaction();
+    kiv::Commit commit = kiv::Commit::create(repository_);
+    if (parent) commit->addParent(parent);
+    for (const ModelElement& item : created) commit->addCreated(item);
+    for (const ModelElement& item : updated) commit->addUpdated(item);
+    record.commit();
+    lastUpdated_ = updated;
+    return commit;
   }
 
   const Model& repository() const { return repository_; }
@@ -138,10 +149,11 @@ class LinearHistory {
   std::vector<ModelElement> items_;
   std::vector<kiv::Commit> commits_;
   std::vector<ModelElement> lastUpdated_;
+  std::size_t nextUpdated_ = 0;
 };
 
 // Each history is recorded once, on first use, and kept for the rest of the run.
-const LinearHistory& linearHistory(std::size_t length) {
+LinearHistory& linearHistory(std::size_t length) {
   static std::map<std::size_t, std::unique_ptr<LinearHistory>> histories;
   std::unique_ptr<LinearHistory>& history = histories[length];
   if (!history) history = std::make_unique<LinearHistory>(length);
@@ -209,6 +221,67 @@ void findFromTip(benchmark::State& state, bool dormant) {
 void historyLengths(benchmark::internal::Benchmark* benchmark) {
   benchmark->Arg(100)->Arg(1000)->Arg(10000)->ArgName("length");
 }
+
+// In steady use: each iteration first records one more commit on the line (untimed), then
+// takes the snapshot of that new tip, which starts from the state kept for its parent.
+void snapshotOfNewTip(benchmark::State& state) {
+  LinearHistory& history = linearHistory(static_cast<std::size_t>(state.range(0)));
+  kiv::Commit tip = history.tip();
+  const Model& repository = history.repository();
+  {
+    // The first snapshot composes the whole line; what is measured is the steady state.
+    Transaction warmUp = repository->beginTransaction();
+    tip->getSnapshot();
+    warmUp.cancel();
+  }
+  for (auto _ : state) {
+    state.PauseTiming();
+    tip = history.record(tip);
+    Transaction scratch = repository->beginTransaction();
+    state.ResumeTiming();
+    benchmark::DoNotOptimize(tip->getSnapshot());
+    state.PauseTiming();
+    scratch.cancel();
+    state.ResumeTiming();
+  }
+}
+
+// Two branches that left the line 10 commits ago, each one commit further per iteration
+// (untimed), merged by the default strategy (rolled back): three snapshots, the base's
+// kept and the two tips' one commit from a kept state.
+void mergeOfBranchesTenBack(benchmark::State& state) {
+  LinearHistory& history = linearHistory(static_cast<std::size_t>(state.range(0)));
+  kiv::Commit ours = history.tip(), theirs = history.tip();
+  for (int i = 0; i < 10; ++i) {
+    ours = history.record(ours);
+    theirs = history.record(theirs);
+  }
+  const std::shared_ptr<kiv::IMergeStrategy> strategy = kiv::makeDefaultMergeStrategy();
+  const Model& repository = history.repository();
+  {
+    Transaction warmUp = repository->beginTransaction();
+    strategy->run(ours, theirs);
+    warmUp.cancel();
+  }
+  for (auto _ : state) {
+    state.PauseTiming();
+    ours = history.record(ours);
+    theirs = history.record(theirs);
+    Transaction scratch = repository->beginTransaction();
+    state.ResumeTiming();
+    benchmark::DoNotOptimize(strategy->run(ours, theirs));
+    state.PauseTiming();
+    scratch.cancel();
+    state.ResumeTiming();
+  }
+}
+
+void longHistoryLengths(benchmark::internal::Benchmark* benchmark) {
+  benchmark->Arg(1000)->Arg(10000)->Arg(100000)->ArgName("length")->Unit(benchmark::kMicrosecond);
+}
+
+BENCHMARK(snapshotOfNewTip)->Apply(longHistoryLengths);
+BENCHMARK(mergeOfBranchesTenBack)->Apply(longHistoryLengths);
 
 BENCHMARK(snapshotOfTip)->Apply(historyLengths)->Unit(benchmark::kMicrosecond);
 BENCHMARK(diffOfTipAgainstNear)->Apply(historyLengths)->Unit(benchmark::kMicrosecond);

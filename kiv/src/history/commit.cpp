@@ -2,6 +2,7 @@
 #include "history/composed_state.h"
 #include "history/first_parent_states.h"
 #include "history/history_support.h"
+#include "history/snapshot_states.h"
 #include "kiv/messages/messages.h"
 #include "kiv/metamodel/commit_impl.h"
 #include "kiv/metamodel/delta_impl.h"
@@ -119,16 +120,17 @@ ObjectStorage Commit::Impl::find(const qf::zero::Uuid& uuid) const {
 }
 
 // The deltas from this commit back along first parents to an initial commit or to the
-// first snapshot, composed most recent first. A commit without a delta contributes an
-// empty scratch delta that does not outlive the call.
+// first snapshot, composed most recent first; a commit without a delta counts as one that
+// recorded nothing. The composition usually starts from a state kept for a recent commit.
 Delta Commit::Impl::getSnapshot() const {
   qf::zero::Transaction transaction = history::beginTransactionOn(*this);
-  std::vector<Delta> deltas = history::snapshotDeltas(self(this));
-  Delta scratch;
-  if (!history::isLive(deltas.front())) deltas.front() = scratch = Delta::create(getModel());
-  const Delta snapshot = Delta::Impl::compose(deltas);
+  const history::ComposedState state = history::snapshotState(self(this));
+  const Delta snapshot = Delta::create(getModel());
+  auto& current = snapshot->getCurrentMutable();
+  for (const auto& [uuid, storage] : state.current) current.add(storage);
+  auto& previous = snapshot->getPreviousMutable();
+  for (const auto& [uuid, storage] : state.previous) previous.add(storage);
   snapshot->setIsSnapshot(true);
-  if (scratch) scratch.destroy();
   transaction.commit();
   return snapshot;
 }
@@ -147,10 +149,14 @@ std::vector<Delta> snapshotDeltas(const Commit& commit) {
   return deltas;
 }
 
-ComposedState snapshotState(const Commit& commit) {
+ComposedState snapshotStateComposed(const Commit& commit) {
   ComposedState state = composeState(snapshotDeltas(commit));
   state.isSnapshot = true;
   return state;
+}
+
+ComposedState snapshotState(const Commit& commit) {
+  return SnapshotStates::of(*commit->getModelImpl()).stateOf(commit);
 }
 
 }  // namespace history

@@ -1,10 +1,13 @@
 // The walks over the commit graph: paths, ancestry, selection by depth and range.
 #include "history/ancestry.h"
 #include "history/history_support.h"
+#include "history/path_order_walk.h"
 #include "kiv/metamodel/commit_impl.h"
 
+#include <algorithm>
 #include <climits>
 #include <deque>
+#include <unordered_map>
 #include <unordered_set>
 
 namespace kiv {
@@ -12,9 +15,44 @@ namespace kiv {
 namespace {
 
 using Path = std::vector<Commit>;
+using history::parentsOf;
+
+// Every commit whose distance from one of `starts` along parents is below `limit`, with
+// null standing for a parent that is not resident: exactly the commits that the first
+// `limit` places of some path of a start hold, since a commit is on such a prefix when its
+// nearest start is near enough.
+void insertNearerThan(const std::unordered_set<Commit>& starts, std::size_t limit,
+                      std::unordered_set<Commit>& result) {
+  if (limit == 0) return;
+  std::unordered_map<const Commit::Impl*, std::size_t> distance;
+  std::deque<Commit> pending;
+  for (const Commit& start : starts) {
+    if (!start || !distance.emplace(start.getImpl(), 0).second) continue;
+    pending.push_back(start);
+    result.insert(start);
+  }
+  while (!pending.empty()) {
+    const Commit commit = std::move(pending.front());
+    pending.pop_front();
+    const std::size_t next = distance.at(commit.getImpl()) + 1;
+    if (next >= limit || commit->isInitial()) continue;
+    for (Commit& parent : parentsOf(commit)) {
+      if (!parent) {
+        result.insert(parent);
+      } else if (distance.emplace(parent.getImpl(), next).second) {
+        result.insert(parent);
+        pending.push_back(std::move(parent));
+      }
+    }
+  }
+}
+
+}  // namespace
+
+namespace history {
 
 std::vector<Commit> parentsOf(const Commit& commit) {
-  const auto& parents = commit.getParents();
+  const auto& parents = commit->getParents();
   std::vector<Commit> resolved;
   resolved.reserve(parents.size());
   for (const qf::zero::ModelElement& parent : parents.getAllValuesAndProxies()) {
@@ -23,9 +61,12 @@ std::vector<Commit> parentsOf(const Commit& commit) {
   return resolved;
 }
 
-}  // namespace
-
-namespace history {
+std::vector<Commit> walkTo(const std::vector<WalkStep>& steps, std::size_t last) {
+  std::vector<Commit> walk;
+  for (std::size_t at = last; at != kFirstStep; at = steps[at].previous) walk.push_back(steps[at].commit);
+  std::reverse(walk.begin(), walk.end());
+  return walk;
+}
 
 bool reaches(const Commit& from, const Commit::Impl& target) {
   std::vector<Commit> pending{from};
@@ -69,13 +110,23 @@ std::vector<Path> Commit::Impl::findPathHelper(const std::function<bool(const Co
   return finished;
 }
 
-// A target that is no ancestor is told apart first: the walk itself would only give up
-// after every path had ended, which is exponential in the merges on the way.
+// The path findPathHelper would find first, found in its order; a commit is entered by
+// the first walk to reach it only, since the first walk to a commit is first to whatever
+// lies behind it. Each commit is entered once, so a target that is no ancestor costs one
+// walk over the history behind this commit.
 Path Commit::Impl::findPath(const Commit& target) const {
-  if (!target || !history::reaches(Commit(const_cast<Impl*>(this)), *target.getImpl())) return {};
-  std::vector<Path> found = findPathHelper([&](const Commit& commit) { return commit == target; });
-  if (found.size() == 1 && found.front().back() == target) return std::move(found.front());
-  return {};
+  if (!target) return {};
+  std::vector<history::WalkStep> steps;
+  std::size_t found = history::kFirstStep;
+  history::walkInPathOrder(
+      steps, Commit(const_cast<Impl*>(this)), 1, [](const Commit&, const Commit&) { return true; },
+      [&](std::size_t at) {
+        if (steps[at].commit != target) return false;
+        found = at;
+        return true;
+      },
+      [](std::size_t) { return false; });
+  return found == history::kFirstStep ? Path{} : history::walkTo(steps, found);
 }
 
 std::vector<Path> Commit::Impl::findAllPaths() const {
@@ -92,24 +143,17 @@ bool Commit::Impl::isPredecessorOf(const Commit& other) const {
 void Commit::Impl::select(const std::unordered_set<Commit>& commits, std::unordered_set<Commit>& result,
                           int depth) {
   const std::size_t limit = depth < 0 ? static_cast<std::size_t>(INT_MAX) : static_cast<std::size_t>(depth);
-  if (limit == 0) return;
-  for (const Commit& commit : commits) {
-    if (!commit) continue;
-    for (const Path& path : commit->findAllPaths()) {
-      const std::size_t count = std::min(limit, path.size());
-      result.insert(path.begin(), path.begin() + static_cast<std::ptrdiff_t>(count));
-    }
-  }
+  insertNearerThan(commits, limit, result);
 }
 
 // The commits reachable from `commits` but not from `predecessors`, both sides including
-// the start commits themselves.
+// the start commits themselves. What `result` held before loses the excluded commits too.
 void Commit::Impl::selectInRange(const std::unordered_set<Commit>& predecessors,
                                  const std::unordered_set<Commit>& commits,
                                  std::unordered_set<Commit>& result) {
   std::unordered_set<Commit> excluded;
-  select(predecessors, excluded, -1);
-  select(commits, result, -1);
+  insertNearerThan(predecessors, static_cast<std::size_t>(INT_MAX), excluded);
+  insertNearerThan(commits, static_cast<std::size_t>(INT_MAX), result);
   for (const Commit& commit : excluded) result.erase(commit);
 }
 

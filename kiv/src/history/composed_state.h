@@ -28,8 +28,12 @@ struct ComposedState {
 // deltas count as empty; so does an empty sequence.
 ComposedState composeState(const std::vector<Delta>& deltas);
 
-// The entries of commit->getSnapshot(), without making the snapshot delta.
+// The entries of commit->getSnapshot(), without making the snapshot delta; usually from a
+// state kept for a recent commit (history/snapshot_states.h).
 ComposedState snapshotState(const Commit& commit);
+
+// The same, composed from every delta of the commit's line.
+ComposedState snapshotStateComposed(const Commit& commit);
 
 // The deltas a snapshot of `commit` composes: its own, then its first parents' back to
 // an initial commit or to a snapshot delta, most recent first; null where a commit

@@ -63,19 +63,9 @@ void FirstParentStates::extendTo(const Commit& tip) {
   states_.clear();
 }
 
-// The marks of the previous line go as far as its parents still lead; a mark left behind
-// on a line that was changed only costs a needless rebuild later.
-void FirstParentStates::unwatchLine() {
-  for (qf::zero::ModelElement commit = tip_; commit && commit.isLive() && commit->isWatched();) {
-    commit->setWatched(false);
-    const Commit typed = qf::zero::elementCast<Commit>(commit);
-    if (const Delta delta = typed->getDelta()) delta->setWatched(false);
-    commit = heldFirstParent(typed);
-  }
-}
-
+// The marks of a line left behind stay: the kept snapshot states may rely on them, and a
+// change there only costs a needless rebuild later.
 void FirstParentStates::rebuild(const Commit& tip) {
-  unwatchLine();
   states_.clear();
   tip_ = tip;
   usable_ = true;

@@ -48,7 +48,6 @@ class FirstParentStates {
   // farther. False when the delta holds an entry that is not a resident storage.
   bool absorb(const Commit& commit, bool nearest);
   void watch(const qf::zero::ModelElement& element);
-  void unwatchLine();
 
   Commit tip_;
   Commit lastMiss_;                // the tip of the last question the index could not take

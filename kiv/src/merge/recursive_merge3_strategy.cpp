@@ -1,7 +1,7 @@
 #include "kiv/merge/recursive_merge3_strategy.h"
 
 #include "history/history_support.h"
-#include "kiv/merge/merge3_strategy.h"
+#include "kiv/merge/lowest_common_ancestors.h"
 #include "kiv/metamodel/commit_impl.h"
 #include "kiv/metamodel/delta_impl.h"
 #include "merge/merge_support.h"
@@ -18,14 +18,16 @@ RecursiveMerge3Strategy::~RecursiveMerge3Strategy() = default;
 // commit (a commit with several equally long paths is its own ancestor several times),
 // merging it with itself would ask the same question again, so it is the base itself.
 Commit RecursiveMerge3Strategy::run(const Commit& ours, const Commit& theirs) const {
-  const std::vector<Commit> ancestors = Merge3Strategy::findLCA(ours, theirs);
+  history::requireLive(ours, u"kiv.Merge3Strategy.findLCA");
+  history::requireLive(theirs, u"kiv.Merge3Strategy.findLCA");
+  const merge::AncestorList ancestors = merge::summarizeLowestCommonAncestors(ours, theirs);
   qf::zero::Transaction transaction = history::beginTransactionOn(*ours.getImpl());
   Commit base;
   Delta emptyState;
-  if (ancestors.size() == 1 || (ancestors.size() > 1 && ancestors[0] == ancestors[1])) {
-    base = ancestors.front();
-  } else if (ancestors.size() > 1) {
-    base = run(ancestors[0], ancestors[1]);
+  if (ancestors.length == 1 || (ancestors.length > 1 && ancestors.first == ancestors.second)) {
+    base = ancestors.first;
+  } else if (ancestors.length > 1) {
+    base = run(ancestors.first, ancestors.second);
   } else {
     base = Commit::create(ours.getModel());
     emptyState = Delta::create(ours.getModel());

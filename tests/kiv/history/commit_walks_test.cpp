@@ -1,6 +1,12 @@
 // Walks over shaped commit graphs: paths, ancestry, selection by depth and by range.
+#include "kiv/merge/accept_theirs_merge_tool.h"
+#include "kiv/merge/lowest_common_ancestors.h"
+#include "kiv/merge/merge3_strategy.h"
+#include "kiv/merge/recursive_merge3_strategy.h"
+#include "kiv/messages/messages.h"
 #include "kiv/metamodel/commit_impl.h"
 #include "qf/zero/core/model_impl.h"
+#include "qf/zero/core/transaction.h"
 
 #include <gtest/gtest.h>
 
@@ -155,6 +161,80 @@ TEST_F(CrissCross, SelectInRangeKeepsWhatOnlyTheNewEndReaches) {
   out.clear();
   kiv::Commit::Impl::selectInRange({}, g.set("b"), out);
   EXPECT_EQ(g.spell(out), "ab");
+}
+
+// Two lines that merge each other at every rung: x_i merges y_(i-1) into x_(i-1), y_i
+// merges x_(i-1) into y_(i-1), with x_0 the start and y_0 its child. The tips reach the
+// start along 2^rungs paths each, so a walk that took every path would not end; every walk
+// a user's work asks for must.
+class Ladder : public ::testing::Test {
+ protected:
+  static constexpr std::size_t kRungs = 64;
+  void SetUp() override {
+    xs.push_back(kiv::Commit::create(model));
+    ys.push_back(kiv::Commit::create(model));
+    ys[0]->addParent(xs[0]);
+    for (std::size_t rung = 1; rung <= kRungs; ++rung) {
+      kiv::Commit x = kiv::Commit::create(model), y = kiv::Commit::create(model);
+      x->addParent(xs.back());
+      x->addParent(ys.back());
+      y->addParent(ys.back());
+      y->addParent(xs.back());
+      xs.push_back(x);
+      ys.push_back(y);
+    }
+  }
+  qf::zero::Model model = qf::zero::Model::create();
+  std::vector<kiv::Commit> xs, ys;  // by rung
+};
+
+TEST_F(Ladder, PathsAndSelectionsEndOnAHistoryWithExponentiallyManyPaths) {
+  const Path path = xs[kRungs]->findPath(xs[0]);
+  EXPECT_TRUE(std::equal(path.begin(), path.end(), xs.rbegin(), xs.rend())) << "first parents all the way";
+  EXPECT_TRUE(xs[kRungs]->findPath(ys[kRungs]).empty());
+  EXPECT_EQ(ys[kRungs]->findPath(xs[0]).size(), kRungs + 2) << "down the y line, then to the start";
+
+  std::unordered_set<kiv::Commit> selected;
+  kiv::Commit::Impl::select({xs[kRungs]}, selected, 3);
+  EXPECT_EQ(selected.size(), 1u + 2u + 2u) << "the tip, and the two commits of each of the two rungs below";
+  selected.clear();
+  kiv::Commit::Impl::select({xs[kRungs]}, selected, -1);
+  EXPECT_EQ(selected.size(), 1u + 2u * kRungs);
+  selected.clear();
+  kiv::Commit::Impl::selectInRange({xs[kRungs - 2]}, {xs[kRungs], ys[kRungs]}, selected);
+  EXPECT_EQ(selected.size(), 2u + 2u + 1u) << "the two rungs above x_(rungs-2), and its sibling";
+}
+
+TEST_F(Ladder, TheTipsHaveTwoLowestCommonAncestorsAndTheStrategiesSettleThatAsBefore) {
+  // Both tips merge x_(rungs-1) and y_(rungs-1): a criss-cross at every rung. x's first path
+  // that ends in the list leaves the x line at once for y_(rungs-1); the next leaves it one
+  // step later, after x_(rungs-1).
+  const kiv::merge::AncestorList ancestors =
+      kiv::merge::summarizeLowestCommonAncestors(xs[kRungs], ys[kRungs]);
+  EXPECT_FALSE(ancestors.isUnique());
+  EXPECT_EQ(ancestors.length, 3u);
+  EXPECT_EQ(ancestors.first, ys[kRungs - 1]);
+  EXPECT_EQ(ancestors.second, xs[kRungs - 1]);
+
+  const kiv::Merge3Strategy merge3(std::make_unique<kiv::AcceptTheirsMergeTool>());
+  EXPECT_THROW(merge3.run(xs[kRungs], ys[kRungs]),
+               foundation::core::except::Exception<kiv::messages::NoUniqueLCA>);
+
+  // The recursive strategy merges the two ancestors, and theirs, down every rung.
+  const kiv::RecursiveMerge3Strategy recursive(std::make_unique<kiv::AcceptTheirsMergeTool>());
+  qf::zero::Transaction scratch = model->beginTransaction();
+  const kiv::Commit merged = recursive.run(xs[kRungs], ys[kRungs]);
+  EXPECT_TRUE(merged && merged.isLive());
+  scratch.cancel();
+
+  // An ancestor of the tip is the deepest common ancestor, once per walk from the tip to
+  // it: exponentially many entries of one commit, which the three-way strategy refuses and
+  // the recursive one takes as its base.
+  const kiv::merge::AncestorList ofAnAncestor = kiv::merge::summarizeLowestCommonAncestors(xs[kRungs], xs[3]);
+  EXPECT_EQ(ofAnAncestor.length, 3u);
+  EXPECT_EQ(ofAnAncestor.first, xs[3]);
+  EXPECT_EQ(ofAnAncestor.second, xs[3]);
+  EXPECT_FALSE(ofAnAncestor.isUnique());
 }
 
 }  // namespace

@@ -1,11 +1,13 @@
 // Properties of recorded histories: seeded random edits of a small user model, recorded
 // as commits on branching lines with hand-built merge commits.
 #include "history_fixture.h"
+#include "kiv/history/kept_snapshot_states.h"
 #include "kiv/history/state_difference.h"
 #include "kiv/metamodel/branch_impl.h"
 #include "support/random_editor.h"
 
 #include <random>
+#include <tuple>
 
 namespace {
 
@@ -63,11 +65,15 @@ class RandomHistory {
   std::vector<JsonValue> states_;
 };
 
-// Each property runs on the history grown from each seed; the seed names the test.
-class HistoryProperties : public ::testing::TestWithParam<unsigned> {
+// Each property runs on the history grown from each seed, with snapshots starting from
+// kept states and composed from every delta.
+class HistoryProperties : public ::testing::TestWithParam<std::tuple<unsigned, bool>> {
  protected:
-  void SetUp() override { history.grow(30, 4); }
-  RandomHistory history{GetParam()};
+  void SetUp() override {
+    kiv::keepSnapshotStates(history.repository(), std::get<1>(GetParam()));
+    history.grow(30, 4);
+  }
+  RandomHistory history{std::get<0>(GetParam())};
 };
 
 // A merge commit's delta runs from its first parent's state. A diff whose path reaches
@@ -172,7 +178,11 @@ TEST_P(HistoryProperties, UndoThenRedoReturnsABranchAndItsModelToWhereTheyWere) 
   EXPECT_EQ(stateOf(user), history.state(tipIndex));
 }
 
-INSTANTIATE_TEST_SUITE_P(Seeds, HistoryProperties, ::testing::Values(7u, 1234u, 99991u),
-                         ::testing::PrintToStringParamName());
+INSTANTIATE_TEST_SUITE_P(Seeds, HistoryProperties,
+                         ::testing::Combine(::testing::Values(7u, 1234u, 99991u), ::testing::Bool()),
+                         [](const auto& info) {
+                           return std::to_string(std::get<0>(info.param)) +
+                                  (std::get<1>(info.param) ? "_KeptStates" : "_Composed");
+                         });
 
 }  // namespace

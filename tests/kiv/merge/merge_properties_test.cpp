@@ -2,6 +2,7 @@
 // three commits of random edits on each side. Every property runs on 300 seeds; a failure
 // names its seed.
 #include "../history/history_fixture.h"
+#include "kiv/history/kept_snapshot_states.h"
 #include "kiv/merge/accept_theirs_merge_strategy.h"
 #include "kiv/merge/accept_theirs_merge_tool.h"
 #include "kiv/merge/merge3_strategy.h"
@@ -26,8 +27,10 @@ struct Divergence {
   JsonValue ourDocument;
 };
 
-class MergeProperties : public ::testing::Test, public HistoryModels {
+// Every property runs with snapshots starting from kept states and composed from every delta.
+class MergeProperties : public ::testing::TestWithParam<bool>, public HistoryModels {
  protected:
+  void SetUp() override { kiv::keepSnapshotStates(repository, GetParam()); }
   Divergence diverge(unsigned seed, int baseEdits, int sideEdits) {
     Divergence d;
     const Model user = Model::create();
@@ -165,7 +168,7 @@ std::vector<StrategySetup> threeWaySetups() {
   };
 }
 
-TEST_F(MergeProperties, DisjointChangesOfBothSidesAllReachTheMergedState) {
+TEST_P(MergeProperties, DisjointChangesOfBothSidesAllReachTheMergedState) {
   int checked = 0, keyClashes = 0;
   for (unsigned seed = 1; seed <= kSeeds; ++seed) {
     const Divergence d = diverge(seed, 20, 3);
@@ -197,7 +200,7 @@ TEST_F(MergeProperties, DisjointChangesOfBothSidesAllReachTheMergedState) {
   EXPECT_LE(keyClashes, 4 * 3);
 }
 
-TEST_F(MergeProperties, AcceptTheirsStrategyRecordsTheirStateWhateverOursHolds) {
+TEST_P(MergeProperties, AcceptTheirsStrategyRecordsTheirStateWhateverOursHolds) {
   for (unsigned seed = 1; seed <= kSeeds; ++seed) {
     SCOPED_TRACE("seed " + std::to_string(seed));
     const Divergence d = diverge(seed, 10, 4);
@@ -258,7 +261,7 @@ struct Recorded {
   std::set<std::string> deleteModify, kept;
 };
 
-TEST_F(MergeProperties, ThePropertyToolKeepsEveryOneSidedChangeAndRecordsEachConflict) {
+TEST_P(MergeProperties, ThePropertyToolKeepsEveryOneSidedChangeAndRecordsEachConflict) {
   int keyClashes = 0, conflicts = 0;
   for (unsigned seed = 1; seed <= kSeeds; ++seed) {
     const Divergence d = diverge(seed, 20, 6);
@@ -341,5 +344,9 @@ TEST_F(MergeProperties, ThePropertyToolKeepsEveryOneSidedChangeAndRecordsEachCon
   EXPECT_GT(conflicts, 100) << "the divergences overlap too rarely to test much";
   EXPECT_LE(keyClashes, 2 * 8);
 }
+
+INSTANTIATE_TEST_SUITE_P(Snapshots, MergeProperties, ::testing::Bool(), [](const auto& info) {
+  return std::string(info.param ? "KeptStates" : "Composed");
+});
 
 }  // namespace

@@ -273,6 +273,14 @@ void ModelImpl::cancelLevel(int level) noexcept {
 void ModelImpl::rollbackLevel(int level) noexcept {
   TransactionState& state = *txn_;
   auto& records = state.levels[level].records;
+  // Undoing a change to a watched element changes it too: whatever was derived from it in
+  // between is stale.
+  for (const ElementRecord* record : records) {
+    if (!record->dead && record->element->isWatched()) {
+      ++watchedChanges_;
+      break;
+    }
+  }
   for (auto it = records.rbegin(); it != records.rend(); ++it) {
     ElementRecord& record = **it;
     if (!record.dead && record.destroyedLevel == level) {
