@@ -14,6 +14,8 @@
 // The aim: each at 200 rounds within 3x its cost at 10 rounds.
 #include "card_metamodel.h"
 #include "kiv/kiv.h"
+#include "kiv/merge/lowest_common_ancestors.h"
+#include "kiv/workspace/load_context.h"
 
 #include <benchmark/benchmark.h>
 
@@ -48,6 +50,7 @@ class Ladder {
     clones_[0]->synchronousPush(kiv::PushMode::TryPush);
     clones_[1]->synchronousPull();
     workspaces_[1] = clones_[1]->getWorkspace(users_[1]);
+    kiv::loadContext(workspaces_[1]);
     for (int i = 0; i < 2; ++i) {
       workspaces_[i]->branch(u"start");
       workspaces_[i]->checkout(u"master");
@@ -57,8 +60,10 @@ class Ladder {
     }
   }
 
-  // One commit of 10 changed cards in clone i's workspace.
+  // One commit of 10 changed cards in clone i's workspace, first brought up to its branch
+  // (a push that merged first moved the branch past it).
   void edit(int i) {
+    workspaces_[i]->updateContext();
     std::vector<ModelElement> all = users_[i]->getTopLevelElements();
     workspaces_[i]->commitTransaction([&] {
       for (std::size_t k = 0; k < 10; ++k) {
@@ -113,6 +118,19 @@ void merge(benchmark::State& state) {
   history.push(1);
 }
 
+// The part of a merge that walks the ladder: what the strategies read of the lowest
+// common ancestors of the two tips.
+void ancestors(benchmark::State& state) {
+  Ladder& history = ladderOf(state);
+  history.edit(0);
+  history.edit(1);
+  const kiv::Commit ours = history.clone(0)->getHead()->getTip();
+  const kiv::Commit theirs = history.clone(1)->getHead()->getTip();
+  for (auto _ : state) benchmark::DoNotOptimize(kiv::merge::summarizeLowestCommonAncestors(ours, theirs));
+  history.push(0);
+  history.push(1);
+}
+
 // Each iteration adds a rung; the iterations are few against the rounds already made.
 void push(benchmark::State& state) {
   Ladder& history = ladderOf(state);
@@ -158,6 +176,7 @@ void rounds(benchmark::internal::Benchmark* benchmark) {
 }
 
 BENCHMARK(merge)->Apply(rounds);
+BENCHMARK(ancestors)->Apply(rounds);
 BENCHMARK(push)->Apply(rounds)->Iterations(5);
 BENCHMARK(pull)->Apply(rounds)->Iterations(5);
 BENCHMARK(checkout)->Apply(rounds);

@@ -6,8 +6,9 @@
 // works on a branch and merges it, then pushes; bob observes the origin, so her push pulls
 // into his clone at once, and he brings his user model up to date. Then both edit the same
 // card: bob pushes first, ann's plain push is refused, and her push that merges first
-// settles it. At the end the origin and both clones hold the same history and both users
-// see the same cards.
+// settles it. Then both work on for thirty rounds, each push merging the other's last one
+// first. At the end the origin and both clones hold the same history and both users see
+// the same cards.
 //
 // Commit ids are the first digits of random UUIDs: they differ from run to run.
 #include "board.h"
@@ -18,9 +19,11 @@
 
 #include <future>
 #include <iostream>
+#include <map>
 #include <memory>
 #include <string>
 #include <utility>
+#include <vector>
 
 using qf::zero::Model;
 using team_of_two::Board;
@@ -43,7 +46,8 @@ struct Member {
 // records the head's tip as its context; loadContext makes the user model show it (here the
 // origin has no commits yet, so the model stays empty either way).
 Member join(const kiv::LocalRepository& origin, std::string name) {
-  Member member{std::move(name)};
+  Member member;
+  member.name = std::move(name);
   member.repository = kiv::LocalRepository::clone(origin, kiv::RepoType::Regular);
   member.workspace = member.repository->getWorkspace(member.user);
   kiv::loadContext(member.workspace);
@@ -84,6 +88,28 @@ void catchUp(const Board& board, const Member& member) {
   member.workspace->updateContext();
   board.show(member.user, member.name + "'s board after updateContext():");
   std::cout << member.name << " can commit: " << yesNo(member.workspace->canCommit()) << "\n";
+}
+
+// The commits behind `tip` and how many paths lead from it back to its first commits, a
+// path being one choice of parent at every merge.
+std::pair<std::size_t, double> commitsAndPaths(const kiv::Commit& tip) {
+  std::map<const void*, double> paths;  // by commit, once all its parents are counted
+  std::vector<std::pair<kiv::Commit, bool>> pending{{tip, false}};
+  while (!pending.empty()) {
+    auto [commit, parentsCounted] = pending.back();
+    pending.pop_back();
+    if (paths.count(commit.getImpl()) != 0) continue;
+    const std::vector<kiv::Commit> parents = commit->getParents().getTypedValues();
+    if (!parentsCounted) {
+      pending.push_back({commit, true});
+      for (const kiv::Commit& parent : parents) pending.push_back({parent, false});
+      continue;
+    }
+    double count = parents.empty() ? 1 : 0;
+    for (const kiv::Commit& parent : parents) count += paths.at(parent.getImpl());
+    paths[commit.getImpl()] = count;
+  }
+  return {paths.size(), paths.at(tip.getImpl())};
 }
 
 }  // namespace
@@ -178,6 +204,26 @@ int main() {
   catchUp(board, ann);
   std::cout << "bob's master, pulled automatically: " << HistoryLog::shortId(bob.tip()) << "\n";
   catchUp(board, bob);
+
+  section("Thirty rounds: each edits a card and pushes, merging the other's last push first");
+  // The history becomes a ladder of merges: the number of paths from the tip back to the
+  // first commit doubles with every rung. Merging, pushing and pulling never take them one
+  // by one, so the last round costs about what the first did.
+  for (int round = 1; round <= 30; ++round) {
+    for (Member* member : {&ann, &bob}) {
+      member->workspace->updateContext();  // after a pull, or a merge its own push made
+      const char16_t* title = member == &ann ? u"Full-text search" : u"Settings";
+      member->workspace->commitTransaction([&] { board.setPoints(board.card(member->user, title), round); });
+      member->workspace->push(kiv::PushMode::MergeFirst).get();
+    }
+  }
+  ann.workspace->synchronousPull();  // bob's last push; bob observes, so he has ann's
+  ann.workspace->updateContext();
+  bob.workspace->updateContext();
+  const auto [commits, paths] = commitsAndPaths(origin->getHead()->getTip());
+  std::cout << "origin's master: " << commits << " commits; " << static_cast<unsigned long long>(paths)
+            << " paths from its tip back to the first commit\n";
+  board.show(ann.user, "ann's board:");
 
   section("Where everyone stands");
   const bool originAnn = origin->isEquivalent(ann.repository);

@@ -36,30 +36,41 @@ std::pair<ObjectStorage, ObjectStorage> replay(const std::vector<Entry>& entries
     if (entry.before && !entry.after) newestDeletion = entry.age;
     if (entry.after && !entry.before && oldestCreation == kNone) oldestCreation = entry.age;
   }
-  std::vector<const Entry*> afters, befores;  // afters newest first, befores oldest first
-  for (auto it = entries.rbegin(); it != entries.rend(); ++it) {
-    if (it->after && (newestDeletion == kNone || it->age > newestDeletion)) afters.push_back(&*it);
-  }
-  for (const Entry& entry : entries) {
-    if (entry.before && (oldestCreation == kNone || entry.age < oldestCreation)) befores.push_back(&entry);
-  }
+  const auto isAfter = [&](const Entry& entry) {
+    return entry.after && (newestDeletion == kNone || entry.age > newestDeletion);
+  };
+  const auto isBefore = [&](const Entry& entry) {
+    return entry.before && (oldestCreation == kNone || entry.age < oldestCreation);
+  };
+  // The afters are taken newest first, from the back; the befores oldest first.
+  std::size_t afters = entries.size();  // one past the next after to take
+  std::size_t befores = 0;              // the next before to take
+  const auto nextAfter = [&] {
+    while (afters > 0 && !isAfter(entries[afters - 1])) --afters;
+  };
+  const auto nextBefore = [&] {
+    while (befores < entries.size() && !isBefore(entries[befores])) ++befores;
+  };
+  nextAfter();
+  nextBefore();
   ObjectStorage current, previous;
-  std::size_t a = 0, b = 0;
-  while (a < afters.size() || b < befores.size()) {
-    const std::size_t afterStep = a < afters.size() ? length - 1 - afters[a]->age : kNone;
-    const std::size_t beforeStep = b < befores.size() ? befores[b]->age : kNone;
+  while (afters > 0 || befores < entries.size()) {
+    const std::size_t afterStep = afters > 0 ? length - 1 - entries[afters - 1].age : kNone;
+    const std::size_t beforeStep = befores < entries.size() ? entries[befores].age : kNone;
     if (afterStep <= beforeStep) {
-      if (!current) current = afters[a]->after;
-      ++a;
+      if (!current) current = entries[afters - 1].after;
+      --afters;
+      nextAfter();
     } else {
       if (!previous) {
-        if (current == befores[b]->before) {
+        if (current == entries[befores].before) {
           current = ObjectStorage();
         } else {
-          previous = befores[b]->before;
+          previous = entries[befores].before;
         }
       }
-      ++b;
+      ++befores;
+      nextBefore();
     }
   }
   return {current, previous};

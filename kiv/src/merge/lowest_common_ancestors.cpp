@@ -1,11 +1,14 @@
 #include "kiv/merge/lowest_common_ancestors.h"
 
+#include "history/commit_depths.h"
 #include "history/history_support.h"
 #include "history/path_order_walk.h"
 #include "kiv/metamodel/commit_impl.h"
 
 #include <algorithm>
 #include <limits>
+#include <optional>
+#include <queue>
 #include <unordered_map>
 #include <utility>
 
@@ -212,8 +215,74 @@ std::vector<Commit> lowestCommonAncestors(const Commit& a, const Commit& b) {
   return list;
 }
 
+namespace {
+
+constexpr std::size_t kThreeOrMore = 3;
+
+// The deepest common ancestors and the length of the list, from what lies above them only:
+// commits are taken tallest first from both sides, so the first that both reach is as deep
+// as any common ancestor, and every walk from `a` or `b` to one of that depth passes only
+// taller commits. nullopt when there are several: which comes first is decided below them.
+std::optional<AncestorList> summarizeFromAbove(const Commit& a, const Commit& b) {
+  history::CommitDepths& depths = history::CommitDepths::of(*a->getModelImpl());
+  struct Reached {
+    Commit commit;
+    std::size_t height = 0;
+    bool fromA = false, fromB = false;
+    std::size_t walksFromA = 0, walksFromB = 0;
+  };
+  std::unordered_map<Key, Reached> reached;
+  std::priority_queue<std::pair<std::size_t, Key>> tallestFirst;
+  const auto reach = [&](const Commit& commit, bool fromA, bool fromB, std::size_t walksA,
+                         std::size_t walksB) {
+    const auto [it, isNew] = reached.try_emplace(commit.getImpl());
+    Reached& entry = it->second;
+    if (isNew) {
+      entry.commit = commit;
+      entry.height = depths.of(commit).height;
+      tallestFirst.emplace(entry.height, commit.getImpl());
+    }
+    entry.fromA = entry.fromA || fromA;
+    entry.fromB = entry.fromB || fromB;
+    entry.walksFromA = addUpTo(entry.walksFromA, walksA, kThreeOrMore);
+    entry.walksFromB = addUpTo(entry.walksFromB, walksB, kThreeOrMore);
+  };
+  reach(a, true, false, 1, 0);
+  reach(b, false, true, 0, 1);
+  std::size_t depth = 0;
+  std::vector<Key> deepest;
+  while (!tallestFirst.empty()) {
+    const auto [height, key] = tallestFirst.top();
+    if (height < depth) break;
+    tallestFirst.pop();
+    const Reached& at = reached.at(key);
+    if (at.fromA && at.fromB) {
+      depth = height;
+      deepest.push_back(key);
+      continue;
+    }
+    if (!at.commit || at.commit->isInitial() || height == depth) continue;
+    const Reached from = at;  // `reached` grows below
+    for (const Commit& parent : history::parentsOf(from.commit)) {
+      reach(parent, from.fromA, from.fromB, from.walksFromA, from.walksFromB);
+    }
+  }
+  AncestorList summary;
+  if (deepest.empty()) return summary;
+  if (deepest.size() > 1) return std::nullopt;
+  const Reached& ancestor = reached.at(deepest.front());
+  const std::size_t ways = depths.of(ancestor.commit).longestWays;
+  summary.length =
+      multiplyUpTo(multiplyUpTo(ancestor.walksFromA, ways, kThreeOrMore), ancestor.walksFromB, kThreeOrMore);
+  summary.first = ancestor.commit;
+  if (summary.length > 1) summary.second = ancestor.commit;
+  return summary;
+}
+
+}  // namespace
+
 AncestorList summarizeLowestCommonAncestors(const Commit& a, const Commit& b) {
-  constexpr std::size_t kThreeOrMore = 3;
+  if (const std::optional<AncestorList> fromAbove = summarizeFromAbove(a, b)) return *fromAbove;
   const CommonAncestry ancestry(a, b, kThreeOrMore);
   AncestorList summary;
   if (ancestry.unrelated()) return summary;

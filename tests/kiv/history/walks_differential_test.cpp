@@ -130,7 +130,8 @@ bool agreesWithTheOracle(RandomHistory& graph) {
       const auto expected = kiv::literal::findPath(from, to);
       const auto actual = from->findPath(to);
       EXPECT_EQ(graph.spell(actual), graph.spell(expected))
-          << "findPath from " << graph.spell(std::vector<Commit>{from}) << "to " << graph.spell(std::vector<Commit>{to});
+          << "findPath from " << graph.spell(std::vector<Commit>{from}) << "to "
+          << graph.spell(std::vector<Commit>{to});
       if (actual != expected) return false;
     }
   }
@@ -139,7 +140,8 @@ bool agreesWithTheOracle(RandomHistory& graph) {
     const Commit b = commits[graph.pick(commits.size())];
     const std::vector<Commit> expected = kiv::literal::findLCA(a, b);
     const std::vector<Commit> actual = kiv::Merge3Strategy::findLCA(a, b);
-    EXPECT_EQ(graph.spell(actual), graph.spell(expected)) << "findLCA of " << graph.spell(std::vector<Commit>{a, b});
+    EXPECT_EQ(graph.spell(actual), graph.spell(expected))
+        << "findLCA of " << graph.spell(std::vector<Commit>{a, b});
     const kiv::merge::AncestorList summary = kiv::merge::summarizeLowestCommonAncestors(a, b);
     EXPECT_EQ(summary.isUnique(), expected.size() == 1)
         << "one ancestor to merge from, " << graph.spell(std::vector<Commit>{a, b});
