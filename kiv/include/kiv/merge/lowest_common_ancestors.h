@@ -22,9 +22,12 @@ namespace kiv::merge {
 // behind `a` and `b` plus, per entry of the list, the history behind `a`.
 std::vector<Commit> lowestCommonAncestors(const Commit& a, const Commit& b);
 
-// What the three-way strategies read of that list, at a cost linear in the history behind
-// `a` and `b` however long the list: its length up to 3 (3 meaning "three or more"; two
-// equal entries count as two here) and its first two entries. REQUIRES: live commits.
+// What the three-way strategies read of that list, however long it is: its length up to 3
+// (3 meaning "three or more"; two equal entries count as two here) and its first two
+// entries. REQUIRES: live commits. With one deepest common ancestor (every history that
+// merges without criss-crosses) the cost is that of the commits above it, the depths of
+// commits being kept beside the history model; with several, or none, it is linear in the
+// history behind `a` and `b`.
 struct AncestorList {
   std::size_t length = 0;
   Commit first, second;
