@@ -278,11 +278,32 @@ void mergeOfBranchesTenBack(benchmark::State& state) {
   }
 }
 
+// The change from one branch's tip to the other's, the two having left the line 10 commits
+// ago: neither is an ancestor of the other, so it is the one snapshot composed with the
+// inverse of the other, both kept; finding that there is no path costs the commits taller
+// than the target, not the line.
+void diffOfBranchesTenBack(benchmark::State& state) {
+  LinearHistory& history = linearHistory(static_cast<std::size_t>(state.range(0)));
+  kiv::Commit ours = history.tip(), theirs = history.tip();
+  for (int i = 0; i < 10; ++i) {
+    ours = history.record(ours);
+    theirs = history.record(theirs);
+  }
+  {
+    // The first snapshots compose the whole line; what is measured is the steady state.
+    Transaction warmUp = history.repository()->beginTransaction();
+    ours->diff(theirs);
+    warmUp.cancel();
+  }
+  measureCancelled(state, history.repository(), [&] { return ours->diff(theirs); });
+}
+
 void longHistoryLengths(benchmark::internal::Benchmark* benchmark) {
   benchmark->Arg(1000)->Arg(10000)->Arg(100000)->ArgName("length")->Unit(benchmark::kMicrosecond);
 }
 
 BENCHMARK(snapshotOfNewTip)->Apply(longHistoryLengths);
+BENCHMARK(diffOfBranchesTenBack)->Apply(longHistoryLengths);
 BENCHMARK(mergeOfBranchesTenBack)->Apply(longHistoryLengths)->Iterations(40);
 
 BENCHMARK(snapshotOfTip)->Apply(historyLengths)->Unit(benchmark::kMicrosecond);

@@ -1,5 +1,6 @@
 // The walks over the commit graph: paths, ancestry, selection by depth and range.
 #include "history/ancestry.h"
+#include "history/commit_depths.h"
 #include "history/history_support.h"
 #include "history/path_order_walk.h"
 #include "kiv/metamodel/commit_impl.h"
@@ -7,6 +8,7 @@
 #include <algorithm>
 #include <climits>
 #include <deque>
+#include <functional>
 #include <unordered_map>
 #include <unordered_set>
 
@@ -68,6 +70,17 @@ std::vector<Commit> walkTo(const std::vector<WalkStep>& steps, std::size_t last)
   return walk;
 }
 
+std::function<bool(const Commit&)> mayLeadTo(const Commit& from, const Commit& target) {
+  if (!isLive(from) || !isLive(target) || from->getModelImpl() != target->getModelImpl()) {
+    return [](const Commit&) { return true; };
+  }
+  CommitDepths& depths = CommitDepths::of(*target->getModelImpl());
+  const std::size_t targetHeight = depths.of(target).height;
+  return [&depths, target, targetHeight](const Commit& commit) {
+    return !commit || commit == target || depths.of(commit).height > targetHeight;
+  };
+}
+
 bool reaches(const Commit& from, const Commit::Impl& target) {
   std::vector<Commit> pending{from};
   std::unordered_set<const Commit::Impl*> visited;
@@ -112,14 +125,16 @@ std::vector<Path> Commit::Impl::findPathHelper(const std::function<bool(const Co
 
 // The path findPathHelper would find first, found in its order; a commit is entered by
 // the first walk to reach it only, since the first walk to a commit is first to whatever
-// lies behind it. Each commit is entered once, so a target that is no ancestor costs one
-// walk over the history behind this commit.
+// lies behind it, and no walk goes below the target's depth. Each commit is entered once,
+// so a target that is no ancestor costs at most one walk over the commits taller than it.
 Path Commit::Impl::findPath(const Commit& target) const {
   if (!target) return {};
+  const Commit self(const_cast<Impl*>(this));
+  const auto mayLead = history::mayLeadTo(self, target);
   std::vector<history::WalkStep> steps;
   std::size_t found = history::kFirstStep;
   history::walkInPathOrder(
-      steps, Commit(const_cast<Impl*>(this)), 1, [](const Commit&, const Commit&) { return true; },
+      steps, self, 1, [&](const Commit&, const Commit& parent) { return mayLead(parent); },
       [&](std::size_t at) {
         if (steps[at].commit != target) return false;
         found = at;

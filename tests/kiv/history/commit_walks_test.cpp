@@ -106,6 +106,21 @@ TEST(CommitWalks, AnInitialCommitIsItsOnlyPath) {
   EXPECT_TRUE(a->isPredecessorOf(a));
 }
 
+// The walk toward a target skips commits no taller than it; the depths it reads are kept,
+// and a parent added later must not leave them stale.
+TEST(CommitWalks, APathThatAParentAddedLaterOpensIsFound) {
+  Graph g;
+  g.add('a');
+  g.add('b', {'a'});
+  g.add('c');
+  g.add('d', {'c'});
+  EXPECT_TRUE(g.at('d')->findPath(g.at('a')).empty());
+  EXPECT_EQ(g.spell(g.at('b')->findPath(g.at('a'))), "ba");
+  g.at('c')->addParent(g.at('b'));
+  EXPECT_EQ(g.spell(g.at('d')->findPath(g.at('a'))), "dcba");
+  EXPECT_TRUE(g.at('a')->findPath(g.at('d')).empty());
+}
+
 // a - b - d - f      d merges c and e merges b: each of d, e reaches both b and c, so
 //  \   X   /         f has four paths back to a, and without a visited set a, b and c
 //   c - e            occur in several of them.

@@ -145,12 +145,16 @@ bool agreesWithTheOracle(RandomHistory& graph) {
     const kiv::merge::AncestorList summary = kiv::merge::summarizeLowestCommonAncestors(a, b);
     EXPECT_EQ(summary.isUnique(), expected.size() == 1)
         << "one ancestor to merge from, " << graph.spell(std::vector<Commit>{a, b});
-    if (expected.size() >= 1) EXPECT_EQ(summary.first, expected[0]);
+    if (expected.size() >= 1) {
+      EXPECT_EQ(summary.first, expected[0]);
+    }
     if (expected.size() >= 2) {
       EXPECT_EQ(summary.second, expected[1]);
       EXPECT_EQ(summary.length, std::min<std::size_t>(expected.size(), 3));
     }
-    if (expected.empty()) EXPECT_EQ(summary.length, 0u);
+    if (expected.empty()) {
+      EXPECT_EQ(summary.length, 0u);
+    }
     if (::testing::Test::HasFailure()) return false;
   }
   for (int round = 0; round < 12; ++round) {
