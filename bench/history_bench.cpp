@@ -278,6 +278,26 @@ void mergeOfBranchesTenBack(benchmark::State& state) {
   }
 }
 
+// The same merge again and again, each cancelled: everything it asks of the history (the
+// three snapshots, the depths of the commits) is kept, so this is the merge itself.
+void mergeAgainOfBranchesTenBack(benchmark::State& state) {
+  LinearHistory& history = linearHistory(static_cast<std::size_t>(state.range(0)));
+  const kiv::Commit base = history.tip();
+  kiv::Commit ours = base, theirs = base;
+  for (int i = 0; i < 10; ++i) {
+    ours = history.record(ours);
+    theirs = history.record(theirs);
+  }
+  const std::shared_ptr<kiv::IMergeStrategy> strategy = kiv::makeDefaultMergeStrategy();
+  for (auto _ : state) {
+    Transaction scratch = history.repository()->beginTransaction();
+    benchmark::DoNotOptimize(strategy->run(ours, theirs));
+    state.PauseTiming();
+    scratch.cancel();
+    state.ResumeTiming();
+  }
+}
+
 // The change from one branch's tip to the other's, the two having left the line 10 commits
 // ago: neither is an ancestor of the other, so it is the one snapshot composed with the
 // inverse of the other, both kept; finding that there is no path costs the commits taller
@@ -305,6 +325,7 @@ void longHistoryLengths(benchmark::internal::Benchmark* benchmark) {
 BENCHMARK(snapshotOfNewTip)->Apply(longHistoryLengths);
 BENCHMARK(diffOfBranchesTenBack)->Apply(longHistoryLengths);
 BENCHMARK(mergeOfBranchesTenBack)->Apply(longHistoryLengths)->Iterations(40);
+BENCHMARK(mergeAgainOfBranchesTenBack)->Apply(longHistoryLengths);
 
 BENCHMARK(snapshotOfTip)->Apply(historyLengths)->Unit(benchmark::kMicrosecond);
 BENCHMARK(diffOfTipAgainstNear)->Apply(historyLengths)->Unit(benchmark::kMicrosecond);

@@ -45,7 +45,8 @@ struct Member {
 
 // Connects to the server, clones what it holds and shows it in a new user model.
 Member join(std::uint16_t port, std::string name) {
-  Member member{std::move(name)};
+  Member member;
+  member.name = std::move(name);
   {
     qf::zero::Transaction transaction = member.repositories->beginTransaction();
     member.server = kiv::RemoteRepository::create(member.repositories);

@@ -28,9 +28,8 @@ CommitDepths::Depth CommitDepths::of(const Commit& commit) {
   qf::zero::ModelImpl& model = *commit->getModelImpl();
   if (seenChanges_ != model.getWatchedChangeCount()) {
     depths_.clear();
-    held_.clear();
   }
-  if (const auto found = depths_.find(commit.getImpl()); found != depths_.end()) return found->second;
+  if (const auto found = depths_.find(commit.getImpl()); found != depths_.end()) return found->second.depth;
 
   // Parents before children, each commit not yet measured once.
   std::vector<std::pair<Commit, bool>> pending{{commit, false}};
@@ -50,21 +49,20 @@ CommitDepths::Depth CommitDepths::of(const Commit& commit) {
     if (!parents.empty()) {
       std::size_t tallest = 0;
       for (const Commit& parent : parents)
-        tallest = std::max(tallest, parent ? depths_.at(parent.getImpl()).height : 1);
+        tallest = std::max(tallest, parent ? depths_.at(parent.getImpl()).depth.height : 1);
       depth.height = tallest + 1;
       depth.longestWays = 0;
       for (const Commit& parent : parents) {
-        const Depth behind = parent ? depths_.at(parent.getImpl()) : Depth{1, 1};
+        const Depth behind = parent ? depths_.at(parent.getImpl()).depth : Depth{1, 1};
         if (behind.height == tallest)
           depth.longestWays = std::min(kManyWays, depth.longestWays + behind.longestWays);
       }
     }
     at->setWatched(true);
-    depths_.emplace(at.getImpl(), depth);
-    held_.emplace(at.getImpl(), at);
+    depths_.emplace(at.getImpl(), Measured{depth, at});
   }
   seenChanges_ = model.getWatchedChangeCount();
-  return depths_.at(commit.getImpl());
+  return depths_.at(commit.getImpl()).depth;
 }
 
 }  // namespace kiv::history

@@ -32,9 +32,12 @@ class CommitDepths {
   Depth of(const Commit& commit);
 
  private:
+  struct Measured {
+    Depth depth;
+    Commit held;  // so that no other commit takes the address
+  };
   std::uint64_t seenChanges_ = 0;
-  std::unordered_map<const Commit::Impl*, Depth> depths_;
-  std::unordered_map<const Commit::Impl*, Commit> held_;  // so that no other commit takes an address
+  std::unordered_map<const Commit::Impl*, Measured> depths_;
 };
 
 }  // namespace kiv::history

@@ -122,7 +122,9 @@ TEST_P(HistoryProperties, TheDifferenceOfTwoStatesTakesOneStateToTheOther) {
     const Model user = fromEmpty ? Model::create() : history.modelAt(a);
     const kiv::Delta difference = kiv::stateDifference(fromEmpty ? kiv::Commit() : history.commit(a),
                                                        toEmpty ? kiv::Commit() : history.commit(b));
-    if (a == b && !fromEmpty && !toEmpty) ASSERT_TRUE(difference->isEmpty());
+    if (a == b && !fromEmpty && !toEmpty) {
+      ASSERT_TRUE(difference->isEmpty());
+    }
     try {
       apply(difference, user);
     } catch (const Exception<qf0::messages::UniquenessConstraint>&) {

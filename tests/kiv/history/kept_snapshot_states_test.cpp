@@ -148,6 +148,15 @@ TEST_P(KeptSnapshotStates, EverySnapshotIsTheCompositionOfItsLine) {
         edit.commit();
       }
     }
+    // Commits made on the line and asked for, then cancelled: the states kept for them go
+    // with them, and those kept for the line before must still hold.
+    const RandomLine before = line;
+    qf::zero::Transaction grow = repository->beginTransaction();
+    line.grow(12);
+    for (std::size_t at = before.commits().size(); at < line.commits().size(); ++at)
+      line.commits()[at]->getSnapshot();
+    grow.cancel();
+    line = before;
   }
 }
 

@@ -106,13 +106,16 @@ TEST_P(RandomOldValues, ReportOldCollectionsAsTheTransactionFoundThem) {
       return items;
     };
     if (!last.report->isChanged(c.element, c.property)) {
-      if (!destroyed) EXPECT_EQ(members(c.items), members(after[i])) << where << " is reported unchanged";
+      if (!destroyed) {
+        EXPECT_EQ(members(c.items), members(after[i])) << where << " is reported unchanged";
+      }
       continue;
     }
     EXPECT_EQ(c.items, itemsOf(last.report->getOldValue(c.element, c.property).getList(), c.property))
         << where;
-    if (!destroyed)
+    if (!destroyed) {
       EXPECT_NE(members(c.items), members(after[i])) << where << " came back but is reported changed";
+    }
   }
 }
 

@@ -6,6 +6,7 @@
 
 #include <gtest/gtest.h>
 
+#include <string>
 #include <tuple>
 #include <utility>
 
@@ -148,6 +149,100 @@ TEST(Transaction, InnerSavepointCancelKeepsOuterChanges) {
   outer.commit();
   EXPECT_EQ(titleOf(l, dune), u"Outer");
 }
+
+// Whether cancelling counts as a change to watched elements, which tells the caches derived
+// from them to start again. Undoing a change to an element that existed before counts; an
+// element made in the cancelled level only vanishes, and must not cost the caches.
+enum class Cancelled {
+  Made,
+  Changed,
+  MadeInSavepoint,
+  ChangedInSavepoint,
+  MadeAndCited,
+  MadeForProxy,
+  ProxiedAfter
+};
+
+struct WatchedCancel {
+  Cancelled what;
+  bool counts;
+};
+
+std::string nameOfCancel(const ::testing::TestParamInfo<WatchedCancel>& info) {
+  static const char* const names[] = {"Made",         "Changed",      "MadeInSavepoint", "ChangedInSavepoint",
+                                      "MadeAndCited", "MadeForProxy", "ProxiedAfter"};
+  return names[static_cast<int>(info.param.what)];
+}
+
+class CancelOfWatched : public ::testing::TestWithParam<WatchedCancel> {};
+
+TEST_P(CancelOfWatched, CountsOnlyWhatExistedBefore) {
+  Library l;
+  Model model = Model::create();
+  ModelElement older = l.book.instantiate(model);
+  const Cancelled what = GetParam().what;
+  // Changes `existing` (or makes a book) and watches what it touched; the count after.
+  const auto changeAndWatch = [&](ModelElement existing) {
+    switch (what) {
+      case Cancelled::Made:
+      case Cancelled::MadeInSavepoint: {
+        ModelElement made = l.book.instantiate(model);
+        made.setPropertyValue(l.title, Value::of(std::u16string(u"new")));
+        made->setWatched(true);
+        break;
+      }
+      case Cancelled::Changed:
+      case Cancelled::ChangedInSavepoint:
+        existing.setPropertyValue(l.title, Value::of(std::u16string(u"changed")));
+        existing->setWatched(true);
+        break;
+      case Cancelled::MadeAndCited: {
+        existing->setWatched(true);
+        const ModelElement cited = l.book.instantiate(model);
+        cited->setWatched(true);
+        existing.getPropertyValue(l.cites).getValue<ReferenceCollection*>()->add(cited);
+        break;
+      }
+      // A proxy, named before or after the element came, resolves to it: what was derived
+      // through the proxy goes stale when the element goes.
+      case Cancelled::MadeForProxy:
+      case Cancelled::ProxiedAfter: {
+        const Uuid id = generateNewUuid();
+        const auto proxy = [&] {
+          return ModelElement::Impl::createProxy(model.getImpl(), l.book, ProxyId{id, {}});
+        };
+        if (what == Cancelled::MadeForProxy) proxy();
+        ModelElement made = l.book.instantiate(model, id);
+        made->setWatched(true);
+        if (what == Cancelled::ProxiedAfter) proxy();
+        break;
+      }
+    }
+    return model->getWatchedChangeCount();
+  };
+  std::uint64_t before = 0;
+  Transaction outer = model->beginTransaction();
+  if (what == Cancelled::MadeInSavepoint || what == Cancelled::ChangedInSavepoint) {
+    ModelElement madeInOuterLevel = l.book.instantiate(model);
+    Transaction savepoint = model->beginTransaction();
+    before = changeAndWatch(madeInOuterLevel);
+    savepoint.cancel();
+  } else {
+    before = changeAndWatch(older);
+    outer.cancel();
+  }
+  EXPECT_EQ(model->getWatchedChangeCount() != before, GetParam().counts);
+}
+
+INSTANTIATE_TEST_SUITE_P(Levels, CancelOfWatched,
+                         ::testing::Values(WatchedCancel{Cancelled::Made, false},
+                                           WatchedCancel{Cancelled::Changed, true},
+                                           WatchedCancel{Cancelled::MadeInSavepoint, false},
+                                           WatchedCancel{Cancelled::ChangedInSavepoint, true},
+                                           WatchedCancel{Cancelled::MadeAndCited, true},
+                                           WatchedCancel{Cancelled::MadeForProxy, true},
+                                           WatchedCancel{Cancelled::ProxiedAfter, true}),
+                         nameOfCancel);
 
 struct Recorder : Listener {
   std::shared_ptr<ShallowChangeReport<ModelElement>> last;

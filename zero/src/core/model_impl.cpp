@@ -101,7 +101,7 @@ void ModelImpl::registerElement(ModelElement::Impl* element) {
 }
 
 void ModelImpl::indexElement(ModelElement::Impl* element) {
-  if (!proxies_.empty()) proxies_.erase(element->uuid_);
+  if (!proxies_.empty() && proxies_.erase(element->uuid_) != 0) element->tookOverProxy_ = true;
   instances_[element->getMetaClass().getImpl()].emplace(element->serial_, element);
   updateTopLevel(element);
 }
@@ -274,9 +274,15 @@ void ModelImpl::rollbackLevel(int level) noexcept {
   TransactionState& state = *txn_;
   auto& records = state.levels[level].records;
   // Undoing a change to a watched element changes it too: whatever was derived from it in
-  // between is stale.
+  // between is stale. An element made at this level only vanishes: what was derived from it
+  // alone belongs to it, and an element that came to point at it changed at this level too;
+  // unless a proxy resolved to it, which points at it without a change.
+  const auto onlyVanishes = [&](const ElementRecord& record) {
+    const ModelElement::Impl& element = *record.element;
+    return record.createdLevel == level && !element.tookOverProxy_ && proxies_.count(element.uuid_) == 0;
+  };
   for (const ElementRecord* record : records) {
-    if (!record->dead && record->element->isWatched()) {
+    if (!record->dead && record->element->isWatched() && !onlyVanishes(*record)) {
       ++watchedChanges_;
       break;
     }

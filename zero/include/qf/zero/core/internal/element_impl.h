@@ -144,8 +144,9 @@ class ModelElement::Impl : public RefCounted {
 
   // Change watching, for a library that keeps data derived from some elements (an index):
   // it marks them watched, and the model counts every change and destruction of a watched
-  // element (ModelImpl::getWatchedChangeCount), cancelled ones included. The mark is not
-  // part of the element's state: no transaction records it.
+  // element (ModelImpl::getWatchedChangeCount), cancelled ones included; cancelling the
+  // creation of an element counts only when proxies may have resolved to it. The mark is
+  // not part of the element's state: no transaction records it.
   void setWatched(bool watched) noexcept { watched_ = watched; }
   bool isWatched() const noexcept { return watched_; }
 
@@ -233,6 +234,7 @@ class ModelElement::Impl : public RefCounted {
   std::uint64_t serial_ = 0;
   State state_ = State::Detached;
   bool watched_ = false;
+  bool tookOverProxy_ = false;  // a proxy of the model named this element's UUID when it came
   std::u16string proxyModelUri_;
   std::vector<IncomingReference> incoming_;
 };
