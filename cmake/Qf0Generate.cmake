@@ -7,12 +7,24 @@ include_guard(GLOBAL)
 # which the caller adds to its target's include directories. The generator reruns
 # when the description or the generator changes; files whose text is unchanged keep
 # their time stamps, so nothing that includes them is rebuilt.
+#
+# The same file serves kiv's source tree and an installed kiv: in the source tree the
+# generator is tools/qf0gen beside this file's folder; an installed kiv's package
+# configuration (find_package(kiv CONFIG)) sets KIV_QF0GEN_DIR to the installed generator
+# before including this file.
 find_package(Python3 3.8 REQUIRED COMPONENTS Interpreter)
 # The guard runs this once, in the first directory that includes it, and
 # find_package's results are variables of that directory; the function is called from
 # other directories too, so it reads the interpreter from the cache.
 set(QF0GEN_PYTHON "${Python3_EXECUTABLE}" CACHE INTERNAL "")
-set(QF0GEN_DIR "${CMAKE_CURRENT_LIST_DIR}/../tools/qf0gen" CACHE INTERNAL "")
+if(DEFINED KIV_QF0GEN_DIR)
+    set(QF0GEN_DIR "${KIV_QF0GEN_DIR}" CACHE INTERNAL "")
+else()
+    set(QF0GEN_DIR "${CMAKE_CURRENT_LIST_DIR}/../tools/qf0gen" CACHE INTERNAL "")
+endif()
+if(NOT EXISTS "${QF0GEN_DIR}/qf0gen.py")
+    message(FATAL_ERROR "Qf0Generate: the metamodel generator is not at ${QF0GEN_DIR}/qf0gen.py")
+endif()
 
 function(qf0_generate_metamodel out_var description out_dir)
     get_filename_component(description "${description}" ABSOLUTE)

@@ -174,7 +174,9 @@ def impl_header(d, cls):
 
 
 def _impl_class(d, cls):
-    lines = [f"class {cls.name}::Impl : public {impl_base(cls)} {{", " public:", "  class Storage;",
+    lines = [f"// What a {cls.name} handle's -> reaches: typed getters and setters, mutable collections",
+             "// and the operations. Changes are checked, and recorded for change reports and rollback.",
+             f"class {cls.name}::Impl : public {impl_base(cls)} {{", " public:", "  class Storage;",
              "  template <class B>", "  class BuilderBase;"]
     if not cls.is_abstract:
         lines.append(f"  using BuilderImpl = {cls.name}::Builder;")
@@ -304,7 +306,8 @@ def _builder_base(d, cls):
 
 
 def _builder(cls):
-    return [f"class {cls.name}::Builder : public {cls.name}::Impl::BuilderBase<{cls.name}::Builder> {{", " public:",
+    return [f"// Collects the values of a new {cls.name}, then creates it with all of them at once.",
+            f"class {cls.name}::Builder : public {cls.name}::Impl::BuilderBase<{cls.name}::Builder> {{", " public:",
             f"  explicit Builder(const {QZ}::Model& model = {{}})",
             f"      : {cls.name}::Impl::BuilderBase<{cls.name}::Builder>(model) {{}}",
             f"  {QZ}::IntrusivePtr<{QZ}::ModelElement::Impl> instantiate() override;",

@@ -28,6 +28,8 @@ def header(d):
     lines = [files.banner(d) + f"// {d.meta_class}: the metamodel package, with a handle to each of its items.",
              "#pragma once", "", f'#include "{files.fwd_header(d)}"', '#include "qf/zero/core/meta/abstract_meta_package.h"',
              "", "#include <mutex>", "", ns_open(d.namespace), "",
+             "// The metamodel's items (packages, types, properties, operations), built once per process;",
+             "// documents and reflection find the types by qualified name once it is registered.",
              f"class {d.meta_class} final : public {META}::AbstractMetaPackage {{", " public:",
              "  // The package, built and registered on first use.",
              f"  static {d.meta_class}& getInstance();", "",

@@ -33,7 +33,9 @@ def datatype_header(d, t):
     ns = t.package.namespace
     lines = [files.banner(d) + f"// The datatype \"{t.qualified_name}\": a value compared by value.", "#pragma once", "",
              f'#include "{files.fwd_header(d)}"', '#include "qf/zero/core/meta/property_serializer.h"', "",
-             "#include <string>", "", ns_open(ns), "", f"class {t.name} {{", " public:"]
+             "#include <string>", "", ns_open(ns), "",
+             "// A plain value: copies are independent, and two values are equal when all properties are.",
+             f"class {t.name} {{", " public:"]
     for p in t.properties:
         getter_type = member_type(p) if p.type.cpp in ("bool", "int") else f"const {member_type(p)}&"
         lines += [f"  {getter_type} get{p.cap}() const noexcept {{ return {member(p)}; }}",

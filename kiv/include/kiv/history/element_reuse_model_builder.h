@@ -13,6 +13,8 @@
 
 namespace kiv {
 
+// Reads stored content back into a model that may still hold its elements: a live element
+// with an entry's UUID is refreshed in place, so handles to it stay valid.
 class ElementReuseModelBuilder : public qf::zero::io::ElementReusingModelBuilder {
  public:
   // `reuse` marks a builder that refreshes elements which other elements still refer to:

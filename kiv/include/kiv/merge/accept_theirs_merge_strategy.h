@@ -7,6 +7,8 @@
 
 namespace kiv {
 
+// Takes theirs' state as the merge result without comparing. It holds no state, so one
+// instance serves any number of merges.
 class AcceptTheirsMergeStrategy : public IMergeStrategy {
  public:
   // A new commit in the model of `theirs` whose delta is theirs' snapshot.

@@ -9,6 +9,8 @@
 
 namespace kiv {
 
+// Settles every element both sides changed by taking theirs' entry whole. It records no
+// conflicts and holds no state.
 class AcceptTheirsMergeTool : public IMergeTool {
  public:
   // Copies the entries of the third delta into the first, current and previous maps in

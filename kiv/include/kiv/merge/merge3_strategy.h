@@ -17,6 +17,9 @@
 
 namespace kiv {
 
+// Merges against the one lowest common ancestor: the comparison settles what a single side
+// changed, the owned tool the rest. Histories without a unique ancestor raise "NoUniqueLCA";
+// RecursiveMerge3Strategy merges those.
 class Merge3Strategy : public IMergeStrategy {
  public:
   using Path = std::vector<Commit>;

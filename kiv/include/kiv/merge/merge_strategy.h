@@ -13,6 +13,8 @@
 
 namespace kiv {
 
+// What a branch merges through: run() makes a new commit without parents whose delta takes
+// ours to the merged state; the branch gives it its parents and makes it the tip.
 class IMergeStrategy {
  public:
   virtual ~IMergeStrategy() = default;

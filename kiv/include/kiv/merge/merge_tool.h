@@ -12,6 +12,8 @@
 
 namespace kiv {
 
+// Turns the three deltas of a three-way comparison into the one delta the merged commit
+// records, deciding what the comparison left open. Called by the strategy that owns it.
 class IMergeTool {
  public:
   virtual ~IMergeTool() = default;

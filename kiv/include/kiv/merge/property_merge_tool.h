@@ -55,6 +55,8 @@ enum class ConflictKind {
 
 std::string_view toString(ConflictKind kind);
 
+// One conflict PropertyMergeTool met: the element and property, what each side and the merged
+// state hold, and the side taken. A record only: the merge has settled it already.
 struct MergeConflict {
   qf::zero::Uuid element;
   std::string type;      // the element's qualified class name
@@ -67,6 +69,8 @@ struct MergeConflict {
   MergeSide chosen = MergeSide::Theirs;
 };
 
+// Merges the elements both sides changed property by property and records every conflict,
+// settled by its policy, in conflicts(); a conflict never raises.
 class PropertyMergeTool : public IMergeTool {
  public:
   explicit PropertyMergeTool(ConflictPolicy policy = ConflictPolicy::PreferTheirs);

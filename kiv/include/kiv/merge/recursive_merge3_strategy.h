@@ -15,6 +15,8 @@
 
 namespace kiv {
 
+// A three-way merge of any two histories: several lowest common ancestors are first merged
+// into one base, and unrelated histories merge against an empty state.
 class RecursiveMerge3Strategy : public IMergeStrategy {
  public:
   // REQUIRES: a tool ("ElementRequired" otherwise). The strategy owns it.

@@ -15,6 +15,8 @@
 
 namespace kiv::protocol {
 
+// Writes a history with its branches, commits, deltas and storages in a fixed order, so that
+// equal histories give identical documents.
 class AggregateCustomizer : public qf::zero::io::SerializeCustomizer {
  public:
   AggregateCustomizer();

@@ -28,6 +28,8 @@
 
 namespace kiv::protocol {
 
+// Serves one local repository to any number of connections, taking the requests that use it
+// one at a time. The owner leaves the repository alone until close() has returned.
 class RepositoryServer {
  public:
   // REQUIRES: `served` is a live local repository ("ElementRequired" otherwise).

@@ -17,6 +17,8 @@
 
 namespace kiv::protocol {
 
+// Reads a received history, which refers to commits, deltas and storages it does not carry:
+// such a reference resolves to the receiver's element or becomes a proxy, else the parse fails.
 class TerminatorModelBuilder : public qf::zero::io::ModelBuilder {
  public:
   explicit TerminatorModelBuilder(qf::zero::Model known = qf::zero::Model()) : known_(std::move(known)) {}

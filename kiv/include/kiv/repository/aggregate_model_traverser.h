@@ -13,6 +13,8 @@
 
 namespace kiv {
 
+// Writes the references and containments that the type named at construction declares by
+// what they are, so that an element of that type is written with its aggregate.
 class AggregateModelTraverser : public qf::zero::io::JSONModelTraverser {
  public:
   explicit AggregateModelTraverser(std::u16string qualifiedTypeName)

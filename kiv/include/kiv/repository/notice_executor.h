@@ -28,6 +28,8 @@
 
 namespace kiv {
 
+// Decides when and on which thread the pull of a change notice runs. post() is called on the
+// notifier's thread and must return promptly.
 class NoticeExecutor {
  public:
   virtual ~NoticeExecutor() = default;

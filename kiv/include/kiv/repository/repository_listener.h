@@ -27,6 +27,9 @@
 
 namespace kiv {
 
+// A repository's watch on its own branches: after a committed transaction that changed them it
+// records their new states and notifies the observers once. Made by the repository when it
+// gains an observer.
 class RepositoryListener : public qf::zero::Listener {
  public:
   using Report = qf::zero::DeepChangeReport<qf::zero::ModelElement>;

@@ -27,6 +27,9 @@
 
 namespace kiv {
 
+// Records each committed transaction of the user model as one commit of the workspace's head,
+// except the rewrites it makes itself. A workspace makes and owns it; the user model and the
+// repository model it writes are used from one thread at a time.
 class CommitProducer : public qf::zero::Listener {
  public:
   using Report = qf::zero::ShallowChangeReport<qf::zero::ModelElement>;

@@ -72,6 +72,7 @@ class WideTextParameter {
   MessageArgument value_;
 };
 
+// Narrow (UTF-8) text: a literal, a std::string or a view.
 class NarrowTextParameter {
  public:
   NarrowTextParameter(const char* text) : value_(std::string(text)) {}
@@ -83,6 +84,7 @@ class NarrowTextParameter {
   MessageArgument value_;
 };
 
+// A value of any integer type; bool and the character types are refused at compile time.
 class IntegerParameter {
  public:
   template <MessageInteger T>

@@ -19,6 +19,9 @@
 
 namespace qf::zero {
 
+// Collects the initial values of one element, then creates the element with all of them in
+// one transaction: a value the model refuses leaves nothing behind. Generated classes derive
+// typed builders from it.
 class ModelElement::Builder {
  public:
   class Orchestrator;
@@ -72,6 +75,8 @@ class ModelElement::Builder {
   ModelElement created_;
 };
 
+// Creates the elements of several builders that refer to one another: every element first,
+// then every value, in one transaction. It owns its builders.
 class ModelElement::Builder::Orchestrator {
  public:
   explicit Orchestrator(Model model) : model_(std::move(model)) {}

@@ -18,9 +18,12 @@
 
 namespace qf::zero {
 
+// What one transaction did to its model: the elements added, modified and destroyed, in the
+// order they first changed, and the values they had before. Not changed once made.
 class ReportData {
  public:
   enum class Kind { Added, Modified, Destroyed };
+  // One changed element: how it changed, and its old values unless it was added.
   struct Entry {
     ModelElement element;
     Kind kind;

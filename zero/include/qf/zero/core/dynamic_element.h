@@ -12,6 +12,8 @@
 
 namespace qf::zero {
 
+// The implementation of every element whose class has no generated code; its values are
+// reached reflectively only.
 class DynamicElementImpl final : public ModelElement::Impl {
  public:
   explicit DynamicElementImpl(meta::Class metaClass);

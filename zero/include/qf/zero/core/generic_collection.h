@@ -8,6 +8,8 @@
 
 namespace qf::zero {
 
+// What the collection of any many-valued property offers reflectively: its size, items by
+// position in iteration order, adding, removing and clearing, with the checks of its property.
 class GenericCollectionInterface {
  public:
   virtual ~GenericCollectionInterface() = default;

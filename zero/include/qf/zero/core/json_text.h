@@ -13,6 +13,8 @@
 
 namespace qf::zero {
 
+// A JSON value kept as its compact text: equal values have equal texts, and parse() gives the
+// value back exactly.
 class JsonText {
  public:
   // Holds null.

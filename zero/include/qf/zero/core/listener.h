@@ -22,6 +22,8 @@
 
 namespace qf::zero {
 
+// The base of transaction listeners: a model calls whichever of the four callbacks (see the
+// top of listener.h) the derived class defines, found at compile time when it is registered.
 class Listener {
  public:
   virtual ~Listener() = default;
@@ -30,6 +32,8 @@ class Listener {
   virtual void listenerRemoved() {}
 };
 
+// How a model keeps a registered listener: whether it is deep and which callbacks it has,
+// fixed at registration (ModelImpl::addShallowListener, addDeepListener).
 class ListenerHolderBase {
  public:
   ListenerHolderBase(Listener* listener, bool deep, bool validates, bool modifies, bool observesCommits,
@@ -70,6 +74,8 @@ class ListenerHolderBase {
   bool detached_ = false;
 };
 
+// Calls the callbacks that T defines, with the report typed as a deep or a shallow one; the
+// others cost nothing.
 template <class T, bool Deep>
 class ListenerHolder final : public ListenerHolderBase {
  public:

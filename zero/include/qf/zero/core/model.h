@@ -18,6 +18,8 @@ namespace qf::zero {
 // How a model relates to others; passed through to the model.
 enum class ModelConstellation { Standalone, Shared };
 
+// A counted handle: copies share one ModelImpl, and a default-made handle holds none. ==
+// compares identity.
 class Model {
  public:
   using Impl = ModelImpl;
@@ -74,6 +76,7 @@ class Model::Thawer {
 
 }  // namespace qf::zero
 
+// Hashes by identity, consistent with ==.
 template <>
 struct std::hash<qf::zero::Model> {
   std::size_t operator()(const qf::zero::Model& m) const noexcept {

@@ -19,6 +19,9 @@
 
 namespace qf::zero {
 
+// The handle of an element: a counted reference to its implementation, cheap to copy, null
+// when default-made; == compares identity. Access through it is reflective, by metamodel
+// property; a generated handle adds typed access.
 class ModelElement {
  public:
   class Impl;
@@ -99,6 +102,7 @@ T elementCast(const ModelElement& element);
 
 }  // namespace qf::zero
 
+// Hashes by identity, consistent with ==.
 template <>
 struct std::hash<qf::zero::ModelElement> {
   std::size_t operator()(const qf::zero::ModelElement& e) const noexcept {

@@ -38,6 +38,8 @@ class TransactionFactory {
   Model model_;
 };
 
+// A model's elements, transactions and listeners. Used by one thread at a time: nothing here
+// locks.
 class ModelImpl final : public RefCounted {
  public:
   ModelImpl(const Uuid& id, ModelConstellation constellation);

@@ -15,6 +15,8 @@
 
 namespace qf::zero {
 
+// The collection of one element's many-valued property: every change is checked, runs in a
+// transaction of the owner's model and is recorded for change reports and rollback.
 class AbstractOwnedCollection : public GenericCollectionInterface {
  public:
   AbstractOwnedCollection(ModelElement::Impl* owner, meta::Property property)

@@ -10,6 +10,8 @@
 
 namespace qf::zero {
 
+// The collection of a many-valued property typed by a primitive, enumeration or datatype:
+// items are checked against the property's type, and every change is recorded.
 class PrimitiveCollection : public AbstractOwnedCollection, public GenericSequenceInterface {
  public:
   using AbstractOwnedCollection::AbstractOwnedCollection;
@@ -49,6 +51,8 @@ class PrimitiveCollection : public AbstractOwnedCollection, public GenericSequen
   virtual void basicClearValues() = 0;
 };
 
+// Values of T in insertion order: a sequence keeps duplicates, a set (Unique) keeps each
+// value once.
 template <class T, bool Unique>
 class PrimitiveCollectionOf : public PrimitiveCollection {
  public:

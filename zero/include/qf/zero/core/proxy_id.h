@@ -9,6 +9,7 @@
 
 namespace qf::zero {
 
+// Names an element that is not resident: its UUID and the model that holds it.
 struct ProxyId {
   Uuid elementId{};
   // The URI of the model that holds the element; empty for "the referring model".
@@ -19,6 +20,7 @@ struct ProxyId {
 
 }  // namespace qf::zero
 
+// Hashes the UUID and the model URI, consistent with ==.
 template <>
 struct std::hash<qf::zero::ProxyId> {
   std::size_t operator()(const qf::zero::ProxyId& id) const noexcept {

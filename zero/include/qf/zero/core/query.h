@@ -23,6 +23,8 @@ enum class SearchClassMatchMode { ExactClass, IncludeSubclasses };
 
 class InstanceAttachment;
 
+// Selects from one model the live instances of the classes attached to it that accepts() lets
+// through. The attachments must not outlive the query.
 class AbstractQuery {
  public:
   explicit AbstractQuery(Model model);

@@ -11,6 +11,8 @@
 
 namespace qf::zero {
 
+// An atomic reference count kept in the object itself, for IntrusivePtr: the object deletes
+// itself when the last pointer lets go.
 class RefCounted {
  public:
   void addRef() const noexcept { count_.fetch_add(1, std::memory_order_relaxed); }
@@ -29,6 +31,8 @@ class RefCounted {
   mutable std::atomic<long> count_{0};
 };
 
+// Shares ownership of a RefCounted object through the count in the object, so a raw pointer
+// to a live object can become an owning one again.
 template <class T>
 class IntrusivePtr {
  public:
@@ -61,6 +65,7 @@ class IntrusivePtr {
 
 }  // namespace qf::zero
 
+// Hashes by identity, consistent with ==.
 template <class T>
 struct std::hash<qf::zero::IntrusivePtr<T>> {
   std::size_t operator()(const qf::zero::IntrusivePtr<T>& p) const noexcept {

@@ -18,6 +18,8 @@
 
 namespace qf::zero {
 
+// The collection of a many-valued property typed by a class: every change is checked
+// (containment, opposite ends, uniqueness, map keys) and recorded.
 class ReferenceCollection : public AbstractOwnedCollection,
                             public GenericSequenceInterface,
                             public GenericMapInterface {
@@ -244,6 +246,8 @@ struct ReferenceStore<T, std::map<K, T>> {
 
 }  // namespace internal
 
+// Keeps the targets as handles of T in C: a std::vector for a sequence, a std::unordered_set
+// for a set, a std::map for a map keyed by a property of the target.
 template <class T, class C>
 class TypedReferenceCollection : public ReferenceCollection {
  public:

@@ -21,6 +21,8 @@
 
 namespace qf::zero {
 
+// A scope of changes to one model: commit() keeps them and runs the listeners, cancel() or
+// leaving the scope undoes them. Move-only.
 class Transaction {
  public:
   Transaction() noexcept = default;

@@ -72,6 +72,8 @@ foundation::core::except::MessageArgument typeNameOf();
 
 }  // namespace internal
 
+// An immutable property value for reflective access, cheap to copy. getValue<T>() reads it as
+// T and raises "CannotCastIncompatibleTypes" for any other T.
 class Value {
  public:
   Value() = default;

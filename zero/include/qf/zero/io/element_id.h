@@ -7,6 +7,8 @@
 
 namespace qf::zero::io {
 
+// The identity a document gives an entry; an entry without a UUID makes an element with a
+// fresh one.
 struct ElementId {
   // Absent for an entry that carries no identity: the element gets a fresh UUID.
   boost::optional<Uuid> uuid;

@@ -19,6 +19,8 @@
 
 namespace qf::zero::io {
 
+// Writes a committed transaction's report as JSON, and applies such a report to another model
+// all or nothing.
 class JSONChangeReportSynchronizer {
  public:
   // Applies `report` to `model` in one transaction (a savepoint of the caller's, when

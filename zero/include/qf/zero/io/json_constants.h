@@ -10,6 +10,8 @@
 
 namespace qf::zero::io {
 
+// The member names and the format version of the documents the serializer writes and the
+// parser reads.
 struct JSONConstants {
   static constexpr const char* VERSION_ATTR = "version";
   static constexpr const char* ENTRIES_ATTR = "entries";

@@ -23,6 +23,7 @@
 
 namespace qf::zero::io {
 
+// What a parse made of one entry: the element created or refreshed for it, as a Value.
 class ParseItem {
  public:
   explicit ParseItem(Value value) : value_(std::move(value)) {}
@@ -33,6 +34,8 @@ class ParseItem {
   Value value_;
 };
 
+// Rebuilds the elements of a document in one transaction, all or nothing, keeping the UUIDs
+// written; its customizer decides what is read, its builder how elements are made.
 class JSONParser {
  public:
   // The default customizer and a builder that creates a new element per entry.

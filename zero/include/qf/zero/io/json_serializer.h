@@ -26,6 +26,8 @@
 
 namespace qf::zero::io {
 
+// What a serializer does: an element becomes a document with its aggregate, a value its bare
+// JSON form.
 class Serializer {
  public:
   virtual ~Serializer() = default;
@@ -35,6 +37,8 @@ class Serializer {
   virtual void serialize(const Value& value, const SerializationOutput& output) = 0;
 };
 
+// Writes documents in the layout of json_constants.h; equal models give identical documents.
+// Its traverser picks the properties written, its customizer the elements written alongside.
 class JSONSerializer final : public Serializer {
  public:
   // A JSON model traverser and a default customizer (format "1.0", defaults written).

@@ -13,6 +13,8 @@
 
 namespace qf::zero::io {
 
+// Makes and fills the elements of a parse. The default makes a new element for every entry
+// and refuses a UUID the model holds already.
 class ModelBuilder {
  public:
   virtual ~ModelBuilder() = default;

@@ -20,6 +20,8 @@ enum class PropertyCategory {
   All           // every category (a filter only)
 };
 
+// Decides which properties of a type a traversal visits, and as what. The answers are cached
+// per type, so the metamodel must be complete before the first traversal.
 class ModelTraverser {
  public:
   virtual ~ModelTraverser() = default;

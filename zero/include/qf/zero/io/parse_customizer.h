@@ -21,6 +21,8 @@ namespace qf::zero::io {
 
 class ModelBuilder;
 
+// The hooks through which a parse asks what to read, how to resolve references and how to
+// read values; the defaults read a document as the serializer wrote it.
 class ParseCustomizer {
  public:
   virtual ~ParseCustomizer() = default;

@@ -7,6 +7,8 @@
 
 namespace qf::zero::io {
 
+// Where a serializer writes: a JSON value or a text the caller owns, which must outlive the
+// serialization.
 class SerializationOutput {
  public:
   // Into an nlohmann::ordered_json held by the caller (`json` points at one), with no

@@ -9,6 +9,8 @@
 
 namespace qf::zero::io {
 
+// Decides what a serializer writes beyond the element itself: whether default values are
+// written, the format version, and the elements written with it.
 class SerializeCustomizer {
  public:
   virtual ~SerializeCustomizer() = default;

@@ -26,6 +26,8 @@
 
 namespace qf::zero::meta {
 
+// Owns the model of a metamodel's items and makes each item under a fixed UUID. A derived
+// package builds its items once and never changes them.
 class AbstractMetaPackage {
  public:
   AbstractMetaPackage();

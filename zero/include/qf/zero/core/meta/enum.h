@@ -9,12 +9,15 @@
 
 namespace qf::zero::meta {
 
+// One literal of a run-time enumeration: a property typed by the enumeration holds this
+// element as its value.
 class EnumLiteral : public NamedElement {
   QF_ZERO_HANDLE(EnumLiteral, NamedElement)
   static EnumLiteral create(const Model& model, const Uuid& id, std::u16string name, int value);
   int getValue() const;
 };
 
+// A literal's integral value, fixed when it is made, and the enumeration that owns it.
 class EnumLiteral::Impl : public NamedElement::Impl {
  public:
   Impl(std::u16string name, int value) : NamedElement::Impl(std::move(name)), value_(value) {}
@@ -30,11 +33,15 @@ class EnumLiteral::Impl : public NamedElement::Impl {
   ModelElement::Impl* parent_ = nullptr;  // the owner; raw to avoid a cycle
 };
 
+// An enumeration defined at run time: literals in order, the first being the default value of
+// the properties it types.
 class Enum : public Type {
   QF_ZERO_HANDLE(Enum, Type)
   static Enum create(const Model& model, const Uuid& id, std::u16string name, std::u16string qualifiedName);
 };
 
+// The literals of an enumeration, found by name or by value, and the integral type of their
+// values.
 class Enum::Impl : public Type::Impl {
  public:
   Impl(std::u16string name, std::u16string qualifiedName)

@@ -18,6 +18,8 @@
 
 namespace qf::zero::meta {
 
+// Finds types by qualified name and root packages by URI, for documents, packets and
+// reflection. Lookups are safe from any thread; registering belongs to metamodel set-up.
 class MetaRegistry {
  public:
   using CollectionFactory = std::function<std::unique_ptr<AbstractOwnedCollection>(ModelElement::Impl* owner,

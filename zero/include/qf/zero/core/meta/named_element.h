@@ -15,11 +15,14 @@
 
 namespace qf::zero::meta {
 
+// The handle of every metamodel item: an element of a metamodel's model, with a name.
 class NamedElement : public ModelElement {
   QF_ZERO_HANDLE(NamedElement, ModelElement)
   const std::u16string& getName() const;
 };
 
+// A metamodel item's state: plain C++ members rather than reflective properties, set while the
+// metamodel is built and not changed afterwards.
 class NamedElement::Impl : public ModelElement::Impl {
  public:
   const std::u16string& getName() const noexcept { return name_; }

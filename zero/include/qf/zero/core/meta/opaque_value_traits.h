@@ -12,6 +12,8 @@
 
 namespace qf::zero::meta {
 
+// Traits of values of T that only their own code reads: the default is T{}, and there is no
+// text form, so such values are never parsed or printed.
 template <class T>
 class OpaqueValueTraits final : public ValueTraits {
  public:

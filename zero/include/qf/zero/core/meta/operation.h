@@ -29,11 +29,13 @@ class FunctionInvoker final : public AbstractMethodInvoker {
   Function function_;
 };
 
+// One parameter of an operation, typed and bounded like a property.
 class Argument : public TypedElement {
   QF_ZERO_HANDLE(Argument, TypedElement)
   static Argument create(const Model& model, const Uuid& id, std::u16string name);
 };
 
+// An argument's direction (input unless set otherwise) and the operation that owns it.
 class Argument::Impl : public TypedElement::Impl {
  public:
   explicit Impl(std::u16string name) : TypedElement::Impl(std::move(name)) {}
@@ -50,11 +52,15 @@ class Argument::Impl : public TypedElement::Impl {
   ModelElement::Impl* operation_ = nullptr;  // the owner; raw to avoid a cycle
 };
 
+// A callable feature of a class, typed by its result; called reflectively through
+// ModelElement::invoke.
 class Operation : public TypedElement {
   QF_ZERO_HANDLE(Operation, TypedElement)
   static Operation create(const Model& model, const Uuid& id, std::u16string name);
 };
 
+// An operation's arguments, owning type, flags and invoker; without an invoker it cannot be
+// called reflectively.
 class Operation::Impl : public TypedElement::Impl {
  public:
   explicit Impl(std::u16string name) : TypedElement::Impl(std::move(name)) {}

@@ -10,11 +10,15 @@
 
 namespace qf::zero::meta {
 
+// A namespace of types identified by its URI; registering a root package registers every type
+// in it and its sub-packages.
 class Package : public NamedElement {
   QF_ZERO_HANDLE(Package, NamedElement)
   static Package create(const Model& model, const Uuid& id, std::u16string uri, std::u16string name);
 };
 
+// A package's URI, types, sub-packages and imports; its qualified name prefixes those of its
+// types.
 class Package::Impl : public NamedElement::Impl {
  public:
   Impl(std::u16string uri, std::u16string name) : NamedElement::Impl(std::move(name)), uri_(std::move(uri)) {}

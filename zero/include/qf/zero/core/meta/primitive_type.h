@@ -26,12 +26,14 @@ class ValueTraits {
   virtual std::u16string toText(const Value& value) const = 0;
 };
 
+// A value type without structure; its ValueTraits make, parse and print its values.
 class PrimitiveType : public Type {
   QF_ZERO_HANDLE(PrimitiveType, Type)
   static PrimitiveType create(const Model& model, const Uuid& id, std::u16string name,
                               std::u16string qualifiedName, std::shared_ptr<const ValueTraits> traits);
 };
 
+// The traits of a primitive type, shared and immutable.
 class PrimitiveType::Impl : public Type::Impl {
  public:
   Impl(std::u16string name, std::u16string qualifiedName, std::shared_ptr<const ValueTraits> traits)

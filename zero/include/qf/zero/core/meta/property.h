@@ -22,6 +22,7 @@ class TypedElement : public NamedElement {
   QF_ZERO_HANDLE(TypedElement, NamedElement)
 };
 
+// The type and the multiplicity bounds of a property, argument or operation.
 class TypedElement::Impl : public NamedElement::Impl {
  public:
   Type getType() const;
@@ -45,6 +46,8 @@ class TypedElement::Impl : public NamedElement::Impl {
   bool isOrdered_ = false;
 };
 
+// One feature of a class or datatype. Its kind (ValueFlags), type and index decide how
+// elements hold, check and record its values.
 class Property : public TypedElement {
   QF_ZERO_HANDLE(Property, TypedElement)
   static Property create(const Model& model, const Uuid& id, std::u16string name, ValueFlags flags,
@@ -53,6 +56,8 @@ class Property : public TypedElement {
   std::u16string getQualifiedName() const;  // "package.Class.property"
 };
 
+// A property's definition: kind, containment, index, flags, opposite, map key and default.
+// Set while the metamodel is built; read-only afterwards.
 class Property::Impl : public TypedElement::Impl {
  public:
   Impl(std::u16string name, ValueFlags flags, bool isComposite)
@@ -133,6 +138,7 @@ inline std::u16string Property::getQualifiedName() const { return getImpl()->get
 
 }  // namespace qf::zero::meta
 
+// Hashes by identity, consistent with ==.
 template <>
 struct std::hash<qf::zero::meta::Property> {
   std::size_t operator()(const qf::zero::meta::Property& p) const noexcept {

@@ -21,6 +21,8 @@
 
 namespace qf::zero::meta {
 
+// Converts the values of one type to and from JSON; registered per type and key with the
+// PropertySerializerRegistry.
 class PropertySerializer {
  public:
   virtual ~PropertySerializer() = default;
@@ -44,6 +46,8 @@ class DatatypeSerializer {
   virtual Value setPropertyValue(const Value& datum, const Property& property, const Value& value) const = 0;
 };
 
+// The process-wide table of property and datatype serializers by type. Filled while
+// metamodels are set up; lookups are safe from any thread.
 class PropertySerializerRegistry {
  public:
   static PropertySerializerRegistry& getInstance();

@@ -18,6 +18,8 @@ class StructuredType : public Type {
   QF_ZERO_HANDLE(StructuredType, Type)
 };
 
+// The properties and operations a class or datatype declares, in the order they were added;
+// a class adds those it inherits.
 class StructuredType::Impl : public Type::Impl {
  public:
   // Own properties and operations, in the order they were added.
@@ -40,6 +42,8 @@ class StructuredType::Impl : public Type::Impl {
   std::vector<Operation> ownOperations_;
 };
 
+// Describes elements: instantiate() makes a live element of the class with the builder
+// registered for it.
 class Class : public StructuredType {
   QF_ZERO_HANDLE(Class, StructuredType)
   static Class create(const Model& model, const Uuid& id, std::u16string name, std::u16string qualifiedName,
@@ -49,6 +53,8 @@ class Class : public StructuredType {
   ModelElement instantiate(const Model& model, const Uuid& id = {}) const;
 };
 
+// A class's superclasses and its properties by index, inherited ones first. The tables are
+// built on first use, from any thread, once the metamodel is complete.
 class Class::Impl : public StructuredType::Impl {
  public:
   Impl(std::u16string name, std::u16string qualifiedName, bool isAbstract)
@@ -90,12 +96,15 @@ class Class::Impl : public StructuredType::Impl {
   mutable std::vector<Property> byIndex_;
 };
 
+// Describes structured values, compared by value rather than identity; their properties are
+// read and written through the type's DatatypeSerializer.
 class DataType : public StructuredType {
   QF_ZERO_HANDLE(DataType, StructuredType)
   static DataType create(const Model& model, const Uuid& id, std::u16string name,
                          std::u16string qualifiedName);
 };
 
+// A datatype's properties and operations; its values carry no identity.
 class DataType::Impl : public StructuredType::Impl {
  public:
   Impl(std::u16string name, std::u16string qualifiedName)

@@ -7,6 +7,8 @@
 
 namespace qf::zero::meta {
 
+// Whatever types a property, argument or operation; conformsTo() says whether a value of this
+// type may stand where another is expected.
 class Type : public NamedElement {
   QF_ZERO_HANDLE(Type, NamedElement)
   const std::u16string& getQualifiedName() const;
@@ -15,6 +17,7 @@ class Type : public NamedElement {
   bool conformsTo(const Type& other) const;
 };
 
+// A type's qualified name, under which the MetaRegistry finds it, and its owning package.
 class Type::Impl : public NamedElement::Impl {
  public:
   Package getOwningPackage() const;
