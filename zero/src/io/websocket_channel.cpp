@@ -109,6 +109,13 @@ class WebSocketConnection : public std::enable_shared_from_this<WebSocketConnect
         ws_->async_handshake(endpoint, target, [&](beast::error_code ec) {
           failure = ec;
           connected = !ec;
+          // A declined upgrade leaves the WebSocket layer's open timer armed, and the caller
+          // would wait it out: the refusal is the answer, so nothing more is waited for.
+          if (ec) {
+            const auto none = websocket::stream_base::none();
+            ws_->set_option(websocket::stream_base::timeout{none, none, false});
+            beast::get_lowest_layer(*ws_).close();
+          }
         });
       });
     };
