@@ -5,6 +5,7 @@
 #include "qf/zero/core/meta/meta_registry.h"
 #include "qf/zero/core/meta/property.h"
 #include "qf/zero/core/text.h"
+#include "qf/zero/io/json_change_report_synchronizer.h"
 #include "qf/zero/io/json_constants.h"
 
 #include <nlohmann/json.hpp>
@@ -86,11 +87,8 @@ JsonValue Delta::Impl::toChangeReport() const {
   for (const ObjectStorage& storage : deleted)
     destroyed.push_back(destroyedEntry(storage.getContent(), destroyedIds));
 
-  JsonValue report = JsonValue::object();
-  report[JSONConstants::ADDED_ATTR] = std::move(added);
-  report[JSONConstants::MODIFIED_ATTR] = std::move(modified);
-  report[JSONConstants::DESTROYED_ATTR] = std::move(destroyed);
-  return report;
+  return qf::zero::io::JSONChangeReportSynchronizer::makeChangeReport(std::move(added), std::move(modified),
+                                                                     std::move(destroyed));
 }
 
 }  // namespace kiv

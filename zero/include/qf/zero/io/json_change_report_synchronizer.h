@@ -34,6 +34,10 @@ class JSONChangeReportSynchronizer {
 
   // The JSON form of a committed transaction's report, written with `serializer`.
   static nlohmann::ordered_json writeChangeReport(const ReportData& report, JSONSerializer& serializer);
+
+  // A report of the three given arrays, taken over without a copy.
+  static nlohmann::ordered_json makeChangeReport(nlohmann::ordered_json added, nlohmann::ordered_json modified,
+                                                 nlohmann::ordered_json destroyed);
 };
 
 }  // namespace qf::zero::io
