@@ -3,8 +3,9 @@
 //   - pack: a history of 1,000 commits of 10 cards (plus the initial commit of the 1,000
 //     cards they edit) packed and written as text, against nlohmannDump: writing the same
 //     document as text. The aim: at least half nlohmann's throughput.
-//   - unpack: that text read back into a fresh model (unpack, with every check a receiver
-//     makes), against nlohmannParse: parsing the same text.
+//   - unpack: that text read back into a fresh model (parsed as the packet codec parses it,
+//     then unpack, with every check a receiver makes), against nlohmannParse: nlohmann's
+//     parse of the same text.
 //   - Over WebSocket on loopback, against a RepositoryServer in this process:
 //     cloneOverLoopback clones that history; pushThenPull is one 10-card commit pushed by
 //     one client and pulled by another; noticeToModel is the time from an accepted push to
@@ -18,6 +19,7 @@
 #include "kiv/protocol/repository_server.h"
 #include "kiv/repository/notice_executor.h"
 #include "kiv/workspace/load_context.h"
+#include "qf/zero/core/json_parse.h"
 #include "qf/zero/io/websocket_channel.h"
 
 #include <benchmark/benchmark.h>
@@ -110,7 +112,7 @@ void unpack(benchmark::State& state) {
     const Model target = Model::create();
     const Model known = Model::create();
     benchmark::DoNotOptimize(
-        kiv::protocol::History::unpack(nlohmann::ordered_json::parse(history.text), target, known));
+        kiv::protocol::History::unpack(qf::zero::parseJson(history.text), target, known));
   }
   bytesCounter(state);
 }

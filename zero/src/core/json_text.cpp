@@ -1,5 +1,6 @@
 #include "qf/zero/core/json_text.h"
 
+#include "qf/zero/core/json_parse.h"
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/report_exception.h"
 
@@ -19,6 +20,6 @@ JsonText::JsonText(const nlohmann::ordered_json& value) {
   text_.shrink_to_fit();
 }
 
-nlohmann::ordered_json JsonText::parse() const { return nlohmann::ordered_json::parse(text_); }
+nlohmann::ordered_json JsonText::parse() const { return parseJson(text_); }
 
 }  // namespace qf::zero

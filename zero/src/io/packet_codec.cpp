@@ -1,5 +1,6 @@
 #include "qf/zero/io/packet_codec.h"
 
+#include "qf/zero/core/json_parse.h"
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/report_exception.h"
 
@@ -139,7 +140,7 @@ PacketEnvelope PacketCodec::decode(std::string_view text) {
   checkNesting(text);
   Json json;
   try {
-    json = Json::parse(text);
+    json = parseJson(text);
   } catch (const nlohmann::json::exception& error) {
     // Not only parse errors: a number beyond double's range raises out_of_range.
     malformed("not valid JSON: " + jsonErrorText(error));
