@@ -88,7 +88,7 @@ JsonValue Delta::Impl::toChangeReport() const {
     destroyed.push_back(destroyedEntry(storage.getContent(), destroyedIds));
 
   return qf::zero::io::JSONChangeReportSynchronizer::makeChangeReport(std::move(added), std::move(modified),
-                                                                     std::move(destroyed));
+                                                                      std::move(destroyed));
 }
 
 }  // namespace kiv

@@ -36,7 +36,8 @@ class JSONChangeReportSynchronizer {
   static nlohmann::ordered_json writeChangeReport(const ReportData& report, JSONSerializer& serializer);
 
   // A report of the three given arrays, taken over without a copy.
-  static nlohmann::ordered_json makeChangeReport(nlohmann::ordered_json added, nlohmann::ordered_json modified,
+  static nlohmann::ordered_json makeChangeReport(nlohmann::ordered_json added,
+                                                 nlohmann::ordered_json modified,
                                                  nlohmann::ordered_json destroyed);
 };
 
