@@ -294,9 +294,9 @@ TEST_F(GeneratedClasses, SerializersWriteEnumsByNameRepoInfoByPropertyAndNoPoint
 
 TEST_F(GeneratedClasses, ReflectionFindsInheritedPropertiesInvokersAndInstances) {
   const auto repository = kiv::LocalRepository::create(model);
-  EXPECT_EQ(repository->getPropertyByIndex(1), package.getRepository_head());
-  EXPECT_EQ(repository->getPropertyByIndex(10), package.getLocalRepository_origin());
-  EXPECT_FALSE(repository->getPropertyByIndex(14));
+  EXPECT_EQ(repository->propertyForSlot(1), package.getRepository_head());
+  EXPECT_EQ(repository->propertyForSlot(10), package.getLocalRepository_origin());
+  EXPECT_FALSE(repository->propertyForSlot(14));
 
   auto dependency = kiv::Dependency::create(model);
   dependency.invoke(package.getDependency_load_operation(), {});  // no repository: nothing to load from

@@ -133,8 +133,13 @@ TEST_F(Structure, DefaultsComeFromTheProperty) {
   EXPECT_EQ(leaf.getPropertyValue(tm.kind).getElement(), tm.kindEnum->findLiteral(u"Plain"));
   EXPECT_FALSE(leaf.hasPropertyValue(tm.born));
   EXPECT_FALSE(leaf.getPropertyValue(tm.born).getValue<boost::optional<DateTime>>());
-  EXPECT_EQ(leaf->getPropertyByIndex(12), tm.weight);
-  EXPECT_EQ(leaf->getPropertyByIndex(1), tm.name);
+  EXPECT_EQ(leaf->propertyForSlot(12), tm.weight);
+  EXPECT_EQ(leaf->propertyForSlot(1), tm.name);
+  // A class is an element too: its own slots belong to its metaclass, not to the class
+  // it describes.
+  const ModelElement leafClass(tm.leaf);
+  EXPECT_EQ(leafClass->propertyForSlot(1), leafClass.getMetaClass()->getPropertyByIndex(1));
+  EXPECT_NE(leafClass->propertyForSlot(1), tm.name);
 }
 
 TEST_F(Structure, FrozenModelRefusesChangesUnlessThawed) {

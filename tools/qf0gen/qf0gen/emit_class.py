@@ -203,7 +203,7 @@ def _impl_class(d, cls):
         lines += [""] + [f"  {decl}" for decl in cls.declarations]
     root = cls.superclass is None
     lines += ["", "  // The property with index `index` (inherited ones included); null when there is none.",
-              f"  {QZ}::meta::Property getPropertyByIndex(int index) const override;",
+              f"  {QZ}::meta::Property propertyForSlot(int index) const override;",
               "  // Drops the outgoing references this element holds without owning them.",
               f"  {'virtual ' if root else ''}void convertReferencesToProxies(bool keepProxyIds, "
               f"boost::optional<{QZ}::ProxyId>& proxyId){' override' if not root else ''};"]

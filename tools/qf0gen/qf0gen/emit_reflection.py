@@ -69,10 +69,10 @@ def reflection_source(d, cls):
               f"{QZ}::AbstractOwnedCollection* {n}::Impl::basicGetCollection(const {QZ}::meta::Property& property) const {{"]
     lines += _dispatch(d, cls, many, lambda p: [f"return const_cast<{p.cap}Collection*>(&{member(p)});"],
                        _no_such_property(cls, "basicGetCollection(property)"))
-    lines += ["}", "", f"{QZ}::meta::Property {n}::Impl::getPropertyByIndex(int index) const {{", "  switch (index) {"]
+    lines += ["}", "", f"{QZ}::meta::Property {n}::Impl::propertyForSlot(int index) const {{", "  switch (index) {"]
     for p in cls.properties:
         lines += [f"    case {p.index}:", f"      return {_pkg(d)}.{package_getter(p)}();"]
-    lines += ["    default:", f"      return {base}::getPropertyByIndex(index);", "  }", "}", ""]
+    lines += ["    default:", f"      return {base}::propertyForSlot(index);", "  }", "}", ""]
     lines += [f"std::unique_ptr<{QZ}::ModelElement::Impl::Storage> {n}::Impl::createStorage() const {{",
               "  const auto metaClass = getMetaClass();",
               "  return std::make_unique<Storage>(getUuid(), getModel(), metaClass, metaClass->getSlotCount());", "}",

@@ -136,7 +136,7 @@ bool ModelElement::Impl::ownsProperty(const meta::Property& property) const {
   return owner && getMetaClass()->isSubclassOf(owner);
 }
 
-meta::Property ModelElement::Impl::getPropertyByIndex(int index) const {
+meta::Property ModelElement::Impl::propertyForSlot(int index) const {
   return getMetaClass()->getPropertyByIndex(index);
 }
 
@@ -426,7 +426,7 @@ std::unique_ptr<ModelElement::Impl::Storage> ModelElement::Impl::createStorage()
 }
 
 void ModelElement::Impl::copyValue(Storage* storage, int index) const {
-  const meta::Property property = getPropertyByIndex(index);
+  const meta::Property property = propertyForSlot(index);
   if (property->isMany()) {
     storage->startEditLog(index);
   } else {
@@ -445,7 +445,7 @@ void ModelElement::Impl::restoreFromStorage(Storage* storage, bool collections) 
   }
   for (int index : storage->changedIndexes()) {
     if (!storage->holdsSlot(index)) continue;
-    const meta::Property property = getPropertyByIndex(index);
+    const meta::Property property = propertyForSlot(index);
     if (property->isMany() != collections) continue;
     if (collections) {
       if (storage->holdsEditLog(index)) {

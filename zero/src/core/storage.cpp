@@ -114,7 +114,7 @@ void ModelElement::Impl::Storage::materialize(Impl* element) {
   for (std::size_t index = 0; index < slots_.size(); ++index) {
     Slot& s = slots_[index];
     if (s.kind != SlotKind::EditLog) continue;
-    const meta::Property property = element->getPropertyByIndex(static_cast<int>(index));
+    const meta::Property property = element->propertyForSlot(static_cast<int>(index));
     s.items = element->basicGetCollection(property)->contentsBefore(s.edits);
     s.edits = {};
     s.kind = SlotKind::Contents;
@@ -135,7 +135,7 @@ void ModelElement::Impl::Storage::revertUnchanged(Impl* element) {
   }
   for (int index : changedIndexes()) {
     if (!holdsSlot(index)) continue;
-    const meta::Property property = element->getPropertyByIndex(index);
+    const meta::Property property = element->propertyForSlot(index);
     const bool same = holdsCollection(index)
                           ? element->basicGetCollection(property)->sameContents(oldCollection(index))
                           : element->basicGetValue(property) == oldValue(index);

@@ -82,7 +82,10 @@ class ModelElement::Impl : public RefCounted {
   virtual void setPropertyValue(const meta::Property& property, const Value& value,
                                 AccessTag tag = AccessTag::Default);
   virtual bool hasPropertyValue(const meta::Property& property, AccessTag tag = AccessTag::Default) const;
-  virtual meta::Property getPropertyByIndex(int index) const;
+  // The property whose value this element keeps in slot `index`. Named apart from
+  // meta::Class's getPropertyByIndex: a class is an element too, and its own slots are not
+  // the slots of the elements it describes.
+  virtual meta::Property propertyForSlot(int index) const;
   // setPropertyValue's work. `initializing` (builders) lets read-only and set-once
   // properties take their first value.
   void assignValue(const meta::Property& property, const Value& value, bool initializing);
