@@ -111,11 +111,7 @@ class WebSocketConnection : public std::enable_shared_from_this<WebSocketConnect
           connected = !ec;
           // A declined upgrade leaves the WebSocket layer's open timer armed, and the caller
           // would wait it out: the refusal is the answer, so nothing more is waited for.
-          if (ec) {
-            const auto none = websocket::stream_base::none();
-            ws_->set_option(websocket::stream_base::timeout{none, none, false});
-            beast::get_lowest_layer(*ws_).close();
-          }
+          if (ec) disarmAndClose();
         });
       });
     };
@@ -390,11 +386,16 @@ class WebSocketConnection : public std::enable_shared_from_this<WebSocketConnect
     if (!finished_ || closing_ || shutDown_) return;
     shutDown_ = true;
     closeTimer_.cancel();
-    // Turning both timeouts off cancels the WebSocket layer's own timer.
+    disarmAndClose();
+    work_.reset();
+  }
+
+  // Turning both timeouts off cancels the WebSocket layer's own timer; closing the socket ends
+  // whatever is still pending on it.
+  void disarmAndClose() {
     const auto none = websocket::stream_base::none();
     ws_->set_option(websocket::stream_base::timeout{none, none, false});
     beast::get_lowest_layer(*ws_).close();
-    work_.reset();
   }
 
   std::string describe(const beast::error_code& ec) const {
