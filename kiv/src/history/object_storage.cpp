@@ -1,6 +1,7 @@
 #include "history/history_support.h"
 #include "kiv/history/element_reuse_model_builder.h"
 #include "kiv/metamodel/object_storage_impl.h"
+#include "qf/zero/core/json_text.h"
 #include "qf/zero/core/value.h"
 #include "qf/zero/io/json_constants.h"
 #include "qf/zero/io/json_parser.h"
@@ -37,13 +38,22 @@ qf::zero::io::JSONSerializer& captureSerializer(qf::zero::ModelImpl& model) {
 ObjectStorage ObjectStorage::Impl::setContent(const qf::zero::ModelElement& element) {
   history::requireLive(element, u"kiv.ObjectStorage.setContent");
   qf::zero::Transaction transaction = history::beginTransactionOn(*this);
-  qf::zero::JsonValue entry = captureSerializer(*getModelImpl()).writeEntry(element);
+  qf::zero::JsonText entry =
+      qf::zero::JsonText::fromCompactText(captureSerializer(*getModelImpl()).writeEntryText(element));
   const auto& elementUuidProperty = MetaPackageKiv::getInstance().getObjectStorage_elementUUID();
   // elementUUID is read-only to users; the storage itself names the element it holds.
-  assignValue(elementUuidProperty,
-              qf::zero::Value::createPrimitiveValue(elementUuidProperty, element.getUuid()),
-              /*initializing=*/true);
-  setContent(std::move(entry));
+  if (elementUUID_ != element.getUuid()) {
+    if (canStoreDirectly(elementUuidProperty, /*initializing=*/true)) {
+      qf::zero::Transaction store = beginDirectStore(elementUuidProperty);
+      elementUUID_ = element.getUuid();
+      store.commit();
+    } else {
+      assignValue(elementUuidProperty,
+                  qf::zero::Value::createPrimitiveValue(elementUuidProperty, element.getUuid()),
+                  /*initializing=*/true);
+    }
+  }
+  setContentText(std::move(entry));
   transaction.commit();
   return ObjectStorage(this);
 }

@@ -52,6 +52,10 @@ TEST_P(RoundTrip, WrittenAsTextADocumentIsItsDump) {
     std::string text;
     serializer.serialize(original, SerializationOutput::forText(&text));
     EXPECT_EQ(text, support::serializeModel(original, skipDefaults).dump());
+    for (const ModelElement& element :
+         original->getInstances(ModelElement::metaClass(), query::SearchClassMatchMode::IncludeSubclasses)) {
+      ASSERT_EQ(serializer.writeEntryText(element), serializer.writeEntry(element).dump());
+    }
     std::vector<ModelElement> tops = original->getTopLevelElements();
     if (tops.empty()) continue;
     ordered_json document;

@@ -12,6 +12,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <limits>
 
 namespace qf::zero::io {
 namespace {
@@ -135,6 +136,53 @@ TEST_F(Serializer, ValuesAreWrittenBare) {
   serializer.serialize(a, SerializationOutput::forText(&text));
   EXPECT_EQ(ordered_json::parse(text), write(serializer, a));
 }
+
+// An entry written straight to text must be the entry's dump, byte for byte, whatever its
+// strings hold: the escapes, the code points left as they are, and what a malformed UTF-16
+// text becomes.
+struct EntryTextCase {
+  const char* what;
+  std::u16string name;
+};
+
+class EntryText : public Serializer, public ::testing::WithParamInterface<EntryTextCase> {};
+
+TEST_P(EntryText, IsTheDumpOfTheEntry) {
+  ModelElement g = tm.gadget.instantiate(model);
+  tm.setName(g, GetParam().name);
+  for (const int count : {std::numeric_limits<int>::min(), -1, 0, std::numeric_limits<int>::max()}) {
+    g.setPropertyValue(tm.count, Value::of(count));
+    g.setPropertyValue(tm.flag, Value::of(count > 0));
+    for (const bool skipDefaults : {false, true}) {
+      JSONSerializer serializer;
+      serializer.getCustomizer().setShouldSkipDefaultValues(skipDefaults);
+      EXPECT_EQ(serializer.writeEntryText(g), serializer.writeEntry(g).dump()) << count;
+    }
+  }
+}
+
+std::u16string everyControlCharacter() {
+  std::u16string text;
+  for (char16_t c = 0; c < 0x20; ++c) text += c;
+  return text + u"\x7f";
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Strings, EntryText,
+    ::testing::Values(EntryTextCase{"empty", u""}, EntryTextCase{"plain", u"plain words"},
+                      EntryTextCase{"quote and backslash", u"say \"\\\" twice\\"},
+                      EntryTextCase{"control characters", everyControlCharacter()},
+                      EntryTextCase{"an escape after a multi-byte character", u"\u00e9\n\u4e2d\t"},
+                      EntryTextCase{"line and paragraph separators", u"\u2028\u2029"},
+                      EntryTextCase{"a surrogate pair", u"\U0001F600"},
+                      EntryTextCase{"a lone high surrogate", std::u16string(1, char16_t(0xD83D)) + u"x"},
+                      EntryTextCase{"a lone low surrogate", u"x" + std::u16string(1, char16_t(0xDE00))}),
+    [](const ::testing::TestParamInfo<EntryTextCase>& info) {
+      std::string name = info.param.what;
+      std::replace(name.begin(), name.end(), ' ', '_');
+      name.erase(std::remove(name.begin(), name.end(), '-'), name.end());
+      return name;
+    });
 
 // A metamodel whose values need registered serializers: a C++ enumeration, and an
 // opaque handle that must never reach a document.

@@ -192,6 +192,9 @@ def _impl_class(d, cls):
                       f"  {collection_alias(p)}& get{p.cap}Mutable();"]
         else:
             lines += [f"  {getter_return(p)} get{p.cap}() const;", f"  void set{p.cap}({param(p)} value);"]
+            if p.held_as_text:
+                lines += [f"  // set{p.cap} with the value given as its text, which is not parsed again.",
+                          f"  void set{p.cap}Text({QZ}::JsonText text);"]
     if cls.operations or cls.overrides:
         lines += ["", "  // Operations."]
     for op in cls.operations:
@@ -388,9 +391,11 @@ def _accessors(d, cls, p):
     else:
         value = f"{QZ}::Value::createPrimitiveValue(property, value)"
     if p.held_as_text:
-        lines += ["", f"void {n}::Impl::set{p.cap}({param(p)} value) {{", "  checkNotProxy();",
-                  f"  {QZ}::JsonText text(value);", f"  if ({m} == text) return;", f"  const auto& property = {getter};",
-                  "  if (!canStoreDirectly(property)) {", f"    assignValue(property, {value}, false);",
+        text_value = f"{QZ}::Value::createPrimitiveValue(property, text.parse())"
+        lines += ["", f"void {n}::Impl::set{p.cap}({param(p)} value) {{ set{p.cap}Text({QZ}::JsonText(value)); }}", "",
+                  f"void {n}::Impl::set{p.cap}Text({QZ}::JsonText text) {{", "  checkNotProxy();",
+                  f"  if ({m} == text) return;", f"  const auto& property = {getter};",
+                  "  if (!canStoreDirectly(property)) {", f"    assignValue(property, {text_value}, false);",
                   "    return;", "  }", f"  {QZ}::Transaction transaction = beginDirectStore(property);",
                   f"  {m} = std::move(text);", "  transaction.commit();", "}", "",
                   f"void {n}::Impl::basicSet{p.cap}({param(p)} value) {{", f"  {m} = {QZ}::JsonText(value);", "}", ""]

@@ -216,8 +216,8 @@ void ModelElement::Impl::assignValue(const meta::Property& property, const Value
   transaction.commit();
 }
 
-bool ModelElement::Impl::canStoreDirectly(const meta::Property& property) const {
-  if (property->isReadOnly() || property->isSetOnce()) return false;
+bool ModelElement::Impl::canStoreDirectly(const meta::Property& property, bool initializing) const {
+  if (!initializing && (property->isReadOnly() || property->isSetOnce())) return false;
   const auto keyedByProperty = [&](const void* via) {
     const meta::Property map = propertyHandle(via);
     return map->isMap() && map->getQualifiedBy() == property;
@@ -466,9 +466,9 @@ void ModelElement::Impl::registerIn(ModelImpl* model, const Uuid& id) {
   if (model->isFrozen()) reportException(qf0::messages::CannotModifyFrozenModel());
   const Uuid uuid = id.is_nil() ? generateNewUuid() : id;
   // One look-up both refuses a taken UUID and claims a free one.
-  auto [entry, claimed] = model->elements_.try_emplace(uuid);
-  if (!claimed) reportException(qf0::messages::DuplicateElementId(toText(uuid)));
-  entry->second = IntrusivePtr<Impl>(this);
+  if (!model->elements_.tryInsert(uuid, IntrusivePtr<Impl>(this))) {
+    reportException(qf0::messages::DuplicateElementId(toText(uuid)));
+  }
   Transaction transaction = model->beginTransaction(false);
   uuid_ = uuid;
   model_ = model;
@@ -488,7 +488,7 @@ void ModelElement::Impl::adoptInto(ModelImpl* model, const Uuid& id) {
   if (model == nullptr) return;
   model_ = model;
   serial_ = model->nextSerial_++;
-  model->elements_.emplace(uuid_, IntrusivePtr<Impl>(this));
+  model->elements_.tryInsert(uuid_, IntrusivePtr<Impl>(this));
   model->updateTopLevel(this);
 }
 

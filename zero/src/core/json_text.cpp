@@ -6,6 +6,8 @@
 
 #include <nlohmann/json.hpp>
 
+#include <utility>
+
 namespace qf::zero {
 
 JsonText::JsonText() : text_("null") {}
@@ -18,6 +20,13 @@ JsonText::JsonText(const nlohmann::ordered_json& value) {
   }
   // A dump grows its buffer by doubling: a held text keeps only what it needs.
   text_.shrink_to_fit();
+}
+
+JsonText JsonText::fromCompactText(std::string text) noexcept {
+  JsonText result;
+  result.text_ = std::move(text);
+  result.text_.shrink_to_fit();
+  return result;
 }
 
 nlohmann::ordered_json JsonText::parse() const { return parseJson(text_); }

@@ -7,7 +7,9 @@
 #include "qf/zero/core/report_exception.h"
 
 #include <algorithm>
+#include <cstring>
 #include <exception>
+#include <iterator>
 
 namespace qf::zero {
 
@@ -40,15 +42,28 @@ Transaction TransactionFactory::beginTransaction(bool savepoint) const {
   return model_->beginTransaction(savepoint);
 }
 
+namespace {
+
+// A seed for a table's hash: random, so that no peer can choose colliding UUIDs.
+std::uint64_t randomSeed() {
+  const Uuid random = generateNewUuid();
+  std::uint64_t seed;
+  std::memcpy(&seed, random.data, sizeof seed);
+  return seed;
+}
+
+}  // namespace
+
 ModelImpl::ModelImpl(const Uuid& id, ModelConstellation constellation)
-    : uuid_(id), constellation_(constellation) {}
+    : uuid_(id), constellation_(constellation), elements_(randomSeed()) {}
 
 ModelImpl::~ModelImpl() {
   // Every element outlives its model only as an invalid shell: break the references
   // between them first, then cut them loose.
   std::vector<IntrusivePtr<ModelElement::Impl>> all;
   all.reserve(elements_.size());
-  for (auto& [id, element] : elements_) all.push_back(element);
+  elements_.forEach(
+      [&all](const Uuid&, const IntrusivePtr<ModelElement::Impl>& element) { all.push_back(element); });
   // Everything that could refer to an element dies with it: no incoming index needs
   // keeping, and unlinking entry by entry would cost quadratic time on a target that
   // many elements refer to.
@@ -63,7 +78,7 @@ ModelImpl::~ModelImpl() {
 // ---- elements ---------------------------------------------------------------
 
 ModelElement ModelImpl::findElement(const Uuid& id, FindElementBehavior behavior) const {
-  if (auto it = elements_.find(id); it != elements_.end()) return ModelElement(it->second);
+  if (const auto* element = elements_.find(id)) return ModelElement(*element);
   if (behavior == FindElementBehavior::IncludeProxies) {
     if (auto it = proxies_.find(id); it != proxies_.end()) return ModelElement(it->second);
   }
@@ -96,33 +111,55 @@ std::vector<ModelElement> ModelImpl::getInstances(const meta::Class& metaClass,
 void ModelImpl::registerElement(ModelElement::Impl* element) {
   // An element a cancel brings back takes its UUID over from one created since with the
   // same UUID, which the same cancel removes.
-  elements_.insert_or_assign(element->uuid_, IntrusivePtr<ModelElement::Impl>(element));
+  elements_.insertOrAssign(element->uuid_, IntrusivePtr<ModelElement::Impl>(element));
   indexElement(element);
 }
 
+namespace {
+
+// Serials grow, so a new element goes last: the hint spares the walk down the tree.
+void insertBySerial(std::map<std::uint64_t, ModelElement::Impl*>& bySerial, std::uint64_t serial,
+                    ModelElement::Impl* element) {
+  if (bySerial.empty() || bySerial.rbegin()->first < serial) {
+    bySerial.emplace_hint(bySerial.end(), serial, element);
+  } else {
+    bySerial.emplace(serial, element);
+  }
+}
+
+void eraseBySerial(std::map<std::uint64_t, ModelElement::Impl*>& bySerial, std::uint64_t serial) {
+  if (!bySerial.empty() && bySerial.rbegin()->first == serial) {
+    bySerial.erase(std::prev(bySerial.end()));
+  } else {
+    bySerial.erase(serial);
+  }
+}
+
+}  // namespace
+
 void ModelImpl::indexElement(ModelElement::Impl* element) {
   if (!proxies_.empty() && proxies_.erase(element->uuid_) != 0) element->tookOverProxy_ = true;
-  instances_[element->getMetaClass().getImpl()].emplace(element->serial_, element);
+  insertBySerial(instances_[element->getMetaClass().getImpl()], element->serial_, element);
   updateTopLevel(element);
 }
 
 void ModelImpl::unregisterElement(ModelElement::Impl* element) noexcept {
-  topLevel_.erase(element->serial_);
+  eraseBySerial(topLevel_, element->serial_);
   if (auto it = instances_.find(element->getMetaClass().getImpl()); it != instances_.end()) {
-    it->second.erase(element->serial_);
+    eraseBySerial(it->second, element->serial_);
   }
   // Only its own entry: the UUID may already name an element a cancel brought back.
   // Erasing may drop the last reference: keep it last.
-  if (auto it = elements_.find(element->uuid_); it != elements_.end() && it->second.get() == element) {
-    elements_.erase(it);
+  if (const auto* entry = elements_.find(element->uuid_); entry != nullptr && entry->get() == element) {
+    elements_.erase(element->uuid_);
   }
 }
 
 void ModelImpl::updateTopLevel(ModelElement::Impl* element) noexcept {
   if (element->isTopLevel()) {
-    topLevel_.emplace(element->serial_, element);
+    insertBySerial(topLevel_, element->serial_, element);
   } else {
-    topLevel_.erase(element->serial_);
+    eraseBySerial(topLevel_, element->serial_);
   }
 }
 

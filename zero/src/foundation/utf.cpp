@@ -12,22 +12,24 @@ constexpr char32_t replacementCharacter = 0xFFFD;
 bool isHighSurrogate(char32_t unit) { return unit >= 0xD800 && unit <= 0xDBFF; }
 bool isLowSurrogate(char32_t unit) { return unit >= 0xDC00 && unit <= 0xDFFF; }
 
-void appendUtf8(std::string& out, char32_t cp) {
+// Writes `cp` as UTF-8 at `at` and returns the end of what it wrote (at most four bytes).
+char* putUtf8(char* at, char32_t cp) {
   if (cp < 0x80) {
-    out += static_cast<char>(cp);
+    *at++ = static_cast<char>(cp);
   } else if (cp < 0x800) {
-    out += static_cast<char>(0xC0 | (cp >> 6));
-    out += static_cast<char>(0x80 | (cp & 0x3F));
+    *at++ = static_cast<char>(0xC0 | (cp >> 6));
+    *at++ = static_cast<char>(0x80 | (cp & 0x3F));
   } else if (cp < 0x10000) {
-    out += static_cast<char>(0xE0 | (cp >> 12));
-    out += static_cast<char>(0x80 | ((cp >> 6) & 0x3F));
-    out += static_cast<char>(0x80 | (cp & 0x3F));
+    *at++ = static_cast<char>(0xE0 | (cp >> 12));
+    *at++ = static_cast<char>(0x80 | ((cp >> 6) & 0x3F));
+    *at++ = static_cast<char>(0x80 | (cp & 0x3F));
   } else {
-    out += static_cast<char>(0xF0 | (cp >> 18));
-    out += static_cast<char>(0x80 | ((cp >> 12) & 0x3F));
-    out += static_cast<char>(0x80 | ((cp >> 6) & 0x3F));
-    out += static_cast<char>(0x80 | (cp & 0x3F));
+    *at++ = static_cast<char>(0xF0 | (cp >> 18));
+    *at++ = static_cast<char>(0x80 | ((cp >> 12) & 0x3F));
+    *at++ = static_cast<char>(0x80 | ((cp >> 6) & 0x3F));
+    *at++ = static_cast<char>(0x80 | (cp & 0x3F));
   }
+  return at;
 }
 
 void appendUtf16(std::u16string& out, char32_t cp) {
@@ -85,22 +87,51 @@ char32_t decodeUtf8(std::string_view text, std::size_t& pos) {
   return i == length ? cp : replacementCharacter;
 }
 
+// The length of toUtf8(text): one to three bytes a code unit, four a surrogate pair, three a
+// lone surrogate (its replacement character).
+std::size_t utf8Length(std::u16string_view text) {
+  std::size_t length = 0;
+  for (std::size_t pos = 0; pos < text.size(); ++pos) {
+    const char32_t unit = text[pos];
+    if (unit < 0x80) {
+      length += 1;
+    } else if (unit < 0x800) {
+      length += 2;
+    } else if (isHighSurrogate(unit) && pos + 1 < text.size() && isLowSurrogate(text[pos + 1])) {
+      length += 4;
+      ++pos;
+    } else {
+      length += 3;
+    }
+  }
+  return length;
+}
+
 }  // namespace
+
+// Writes into room made up front, exactly as much as the text needs.
+void appendUtf8(std::string& out, std::u16string_view text) {
+  const std::size_t start = out.size();
+  out.resize(start + utf8Length(text));
+  char* at = out.data() + start;
+  for (std::size_t pos = 0; pos < text.size(); ++pos) {
+    const char32_t unit = text[pos];
+    if (unit < 0x80) {
+      *at++ = static_cast<char>(unit);
+    } else if (isHighSurrogate(unit) && pos + 1 < text.size() && isLowSurrogate(text[pos + 1])) {
+      at = putUtf8(at, 0x10000 + ((unit - 0xD800) << 10) + (text[pos + 1] - 0xDC00));
+      ++pos;
+    } else if (isHighSurrogate(unit) || isLowSurrogate(unit)) {
+      at = putUtf8(at, replacementCharacter);
+    } else {
+      at = putUtf8(at, unit);
+    }
+  }
+}
 
 std::string toUtf8(std::u16string_view text) {
   std::string out;
-  out.reserve(text.size());
-  for (std::size_t pos = 0; pos < text.size(); ++pos) {
-    const char32_t unit = text[pos];
-    if (isHighSurrogate(unit) && pos + 1 < text.size() && isLowSurrogate(text[pos + 1])) {
-      appendUtf8(out, 0x10000 + ((unit - 0xD800) << 10) + (text[pos + 1] - 0xDC00));
-      ++pos;
-    } else if (isHighSurrogate(unit) || isLowSurrogate(unit)) {
-      appendUtf8(out, replacementCharacter);
-    } else {
-      appendUtf8(out, unit);
-    }
-  }
+  appendUtf8(out, text);
   return out;
 }
 

@@ -2,10 +2,12 @@
 
 #include "attribute_codec.h"
 #include "qf/zero/core/json_text.h"
+#include "qf/zero/core/messages.h"
 #include "qf/zero/core/meta/framework_package.h"
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/primitive_collection.h"
 #include "qf/zero/core/reference_collection.h"
+#include "qf/zero/core/report_exception.h"
 #include "qf/zero/core/text.h"
 
 #include <boost/date_time/posix_time/posix_time.hpp>
@@ -13,6 +15,7 @@
 #include <nlohmann/json.hpp>
 
 #include <algorithm>
+#include <charconv>
 #include <optional>
 #include <string>
 #include <unordered_map>
@@ -70,6 +73,57 @@ void appendReferences(std::string& out, const ReferenceCollection& collection, b
     appendQuotedUuid(out, targets[i].getUuid());
   }
   out += ']';
+}
+
+// `text` as dump() writes a JSON string holding toUtf8(text): quoted, with '"', '\\' and the
+// control characters escaped, and nothing else (no ASCII escaping).
+void appendJsonString(std::string& out, std::u16string_view text) {
+  out += '"';
+  const std::size_t start = out.size();
+  foundation::core::text::appendUtf8(out, text);
+  const auto needsEscape = [](char c) {
+    return static_cast<unsigned char>(c) < 0x20 || c == '"' || c == '\\';
+  };
+  const auto first = std::find_if(out.begin() + static_cast<std::ptrdiff_t>(start), out.end(), needsEscape);
+  if (first != out.end()) {
+    const std::string tail(first, out.end());
+    out.erase(first, out.end());
+    for (const char c : tail) {
+      switch (c) {
+        case '"':
+          out += "\\\"";
+          break;
+        case '\\':
+          out += "\\\\";
+          break;
+        case '\b':
+          out += "\\b";
+          break;
+        case '\f':
+          out += "\\f";
+          break;
+        case '\n':
+          out += "\\n";
+          break;
+        case '\r':
+          out += "\\r";
+          break;
+        case '\t':
+          out += "\\t";
+          break;
+        default:
+          if (static_cast<unsigned char>(c) < 0x20) {
+            static constexpr char digits[] = "0123456789abcdef";
+            out += "\\u00";
+            out += digits[(c >> 4) & 0x0f];
+            out += digits[c & 0x0f];
+          } else {
+            out += c;
+          }
+      }
+    }
+  }
+  out += '"';
 }
 
 // A value that does not say which property it belongs to, written by what it holds.
@@ -145,6 +199,10 @@ class JSONSerializer::EntryWriter {
         first = false;
         continue;
       }
+      if (property.scalarText) {
+        if (writeScalarText(impl, property, first, out)) first = false;
+        continue;
+      }
       writeProperty(impl, property, scratch);
       if (scratch.empty()) continue;
       out += first ? "" : ",";
@@ -165,6 +223,7 @@ class JSONSerializer::EntryWriter {
     Value defaultValue;
     std::string key;                         // "<name>": as written in text
     bool mayBeHeldAsText = false;            // a single JsonValue
+    bool scalarText = false;                 // a single string, integer or boolean, written as text directly
     std::optional<std::string> defaultText;  // the default of such a property, as text
   };
   struct ClassPlan {
@@ -180,13 +239,16 @@ class JSONSerializer::EntryWriter {
     plan.entryStart = std::string("{\"") + JSONConstants::TYPE_ATTR +
                       "\":" + ordered_json(plan.typeName).dump() + ",\"" + JSONConstants::ID_ATTR + "\":";
     for (const meta::Property& property : traverser_.getProperties(metaClass, PropertyCategory::All)) {
-      PropertyPlan entry{property, toUtf8(property.getName()), property->isReference(), {}, {}, {}, false,
-                         {}};
+      PropertyPlan entry{
+          property, toUtf8(property.getName()), property->isReference(), {}, {}, {}, false, false, {}};
       entry.key = ordered_json(entry.name).dump() + ":";
       if (!entry.reference) {
         entry.codec = internal::codecFor(property->getType());
         if (entry.codec.kind == internal::AttributeKind::Opaque) continue;
         if (!property->isMany()) entry.defaultValue = property->getDefaultValue();
+        entry.scalarText = !property->isMany() && (entry.codec.kind == internal::AttributeKind::String ||
+                                                   entry.codec.kind == internal::AttributeKind::Integer ||
+                                                   entry.codec.kind == internal::AttributeKind::Boolean);
         if (!property->isMany() && entry.codec.kind == internal::AttributeKind::Json) {
           entry.mayBeHeldAsText = true;
           if (!entry.defaultValue.isEmpty()) {
@@ -227,6 +289,35 @@ class JSONSerializer::EntryWriter {
     }
     if (skipDefaults && (value.isEmpty() || value == plan.defaultValue)) return;
     content[plan.name] = internal::writeAttribute(property, plan.codec, value);
+  }
+
+  // writeProperty for a property planned as scalarText, as text; false when skipped as a default.
+  bool writeScalarText(const ModelElement::Impl& element, const PropertyPlan& plan, bool first,
+                       std::string& out) const {
+    const Value value = element.basicGetValue(plan.property);
+    if (customizer_.shouldSkipDefaultValues() && (value.isEmpty() || value == plan.defaultValue))
+      return false;
+    out += first ? "" : ",";
+    out += plan.key;
+    if (value.isEmpty()) {
+      out += "null";
+      return true;
+    }
+    switch (plan.codec.kind) {
+      case internal::AttributeKind::String:
+        appendJsonString(out, value.getValue<std::u16string>());
+        break;
+      case internal::AttributeKind::Integer: {
+        char digits[16];
+        const auto end = std::to_chars(digits, digits + sizeof digits, value.getValue<int>()).ptr;
+        out.append(digits, end);
+        break;
+      }
+      default:
+        out += value.getValue<bool>() ? "true" : "false";
+        break;
+    }
+    return true;
   }
 
   // writeProperty for a reference, as text; false when skipped as a default.
@@ -283,6 +374,16 @@ void JSONSerializer::emit(ordered_json&& document, const SerializationOutput& ou
 }
 
 ordered_json JSONSerializer::writeEntry(const ModelElement& element) { return writer_->write(element); }
+
+std::string JSONSerializer::writeEntryText(const ModelElement& element) {
+  std::string text;
+  try {
+    writer_->writeText(element, text);
+  } catch (const nlohmann::json::type_error&) {
+    reportException(qf0::messages::InvalidValue());
+  }
+  return text;
+}
 
 void JSONSerializer::serialize(const ModelElement& element, const SerializationOutput& output) {
   serialize(std::vector<ModelElement>{element}, output);

@@ -21,6 +21,9 @@ class JsonText {
   JsonText();
   // Raises "InvalidValue" when a string in `value` is not valid UTF-8: such a value has no text.
   JsonText(const nlohmann::ordered_json& value);  // NOLINT: converts implicitly, as a member type must
+  // Takes `text` unchecked as the compact text of a value: the caller vouches that it is
+  // exactly what the value's compact dump gives (a serializer's text writer writes so).
+  static JsonText fromCompactText(std::string text) noexcept;
 
   nlohmann::ordered_json parse() const;
   const std::string& text() const noexcept { return text_; }

@@ -5,6 +5,7 @@
 #pragma once
 
 #include "qf/zero/core/internal/element_impl.h"
+#include "qf/zero/core/internal/uuid_table.h"
 #include "qf/zero/core/listener.h"
 #include "qf/zero/core/model.h"
 #include "qf/zero/core/query.h"
@@ -152,7 +153,7 @@ class ModelImpl final : public RefCounted {
   Uuid uuid_;
   ModelConstellation constellation_;
   std::u16string uri_;
-  std::unordered_map<Uuid, IntrusivePtr<ModelElement::Impl>, boost::hash<Uuid>> elements_;
+  internal::UuidTable<IntrusivePtr<ModelElement::Impl>> elements_;
   std::map<std::uint64_t, ModelElement::Impl*> topLevel_;
   std::unordered_map<const void*, std::map<std::uint64_t, ModelElement::Impl*>> instances_;
   // Proxies made for elements not resident here; dropped once the element arrives.

@@ -22,6 +22,7 @@
 #include <nlohmann/json_fwd.hpp>
 
 #include <memory>
+#include <string>
 #include <vector>
 
 namespace qf::zero::io {
@@ -61,6 +62,10 @@ class JSONSerializer final : public Serializer {
 
   // The entry of one element, without a document around it.
   nlohmann::ordered_json writeEntry(const ModelElement& element);
+  // writeEntry(element) as its compact text (no ASCII escaping), written without building
+  // the tree. Raises "InvalidValue" when a JSON value in the entry holds a string that is
+  // not valid UTF-8, as a JsonText of the entry would.
+  std::string writeEntryText(const ModelElement& element);
 
  private:
   class EntryWriter;

@@ -188,9 +188,10 @@ class ModelElement::Impl : public RefCounted {
 
   // The typed setter of an attribute: when canStoreDirectly(property) it may, instead of
   // assignValue, open beginDirectStore(property), store the new (different) value raw and
-  // commit. False when the property is read-only or set-once, or keys a map that holds
-  // this element: assignValue's checks need the value then.
-  bool canStoreDirectly(const meta::Property& property) const;
+  // commit. False when the property is read-only or set-once (unless `initializing`, as
+  // assignValue's flag), or keys a map that holds this element: assignValue's checks need
+  // the value then.
+  bool canStoreDirectly(const meta::Property& property, bool initializing = false) const;
   // Checks that this element may change and records the old value of `property`, inside
   // the returned transaction (joined when one is open).
   Transaction beginDirectStore(const meta::Property& property);

@@ -1,0 +1,155 @@
+// UuidTable: a map from UUIDs to nullable handles (an element by its UUID), held in one
+// array probed linearly.
+//
+// A model looks its elements up by UUID on every creation, refresh and reference it reads:
+// a node-based map there costs several cache misses an operation once the model outgrows
+// the cache; here an operation touches one or two neighbouring slots.
+//
+// Contracts: a null value marks a free slot, so a null value is never stored (inserting one
+// is refused). The hash is keyed with a seed drawn per table, so a peer that chooses UUIDs
+// cannot choose their slots; the order of forEach follows the slots and is unspecified.
+// Not thread-safe, as the model that holds it.
+#pragma once
+
+#include "qf/zero/core/uuid.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
+#include <utility>
+#include <vector>
+
+namespace qf::zero::internal {
+
+template <class Handle>
+class UuidTable {
+ public:
+  // `seed` keys the hash; any value works, a random one resists chosen collisions.
+  explicit UuidTable(std::uint64_t seed = 0) : seed_(seed) {}
+
+  std::size_t size() const noexcept { return size_; }
+  bool empty() const noexcept { return size_ == 0; }
+
+  Handle* find(const Uuid& id) noexcept {
+    if (size_ == 0) return nullptr;
+    for (std::size_t at = slotOf(id);; at = (at + 1) & mask()) {
+      Slot& slot = slots_[at];
+      if (!slot.value) return nullptr;
+      if (slot.id == id) return &slot.value;
+    }
+  }
+  const Handle* find(const Uuid& id) const noexcept { return const_cast<UuidTable*>(this)->find(id); }
+
+  // Stores `value` under `id` unless `id` is taken or `value` is null; true when stored.
+  bool tryInsert(const Uuid& id, Handle value) {
+    if (!value) return false;
+    reserveOneMore();
+    Slot& slot = probe(id);
+    if (slot.value) return false;
+    slot.id = id;
+    slot.value = std::move(value);
+    ++size_;
+    return true;
+  }
+
+  // Stores `value` under `id`, replacing what `id` held. A null `value` erases `id`.
+  void insertOrAssign(const Uuid& id, Handle value) {
+    if (!value) {
+      erase(id);
+      return;
+    }
+    reserveOneMore();
+    Slot& slot = probe(id);
+    if (!slot.value) {
+      slot.id = id;
+      ++size_;
+    }
+    slot.value = std::move(value);
+  }
+
+  // Removes `id`; false when it was not there.
+  bool erase(const Uuid& id) noexcept {
+    if (size_ == 0) return false;
+    std::size_t hole = slotOf(id);
+    for (;; hole = (hole + 1) & mask()) {
+      if (!slots_[hole].value) return false;
+      if (slots_[hole].id == id) break;
+    }
+    // Released once the table is whole again: releasing may end an element, whose ending
+    // may look the table up.
+    const Handle released = std::move(slots_[hole].value);
+    // Backward shift: each later slot of the run moves into the hole unless the hole lies
+    // before its home, so every lookup still meets its key before a free slot.
+    for (std::size_t next = (hole + 1) & mask(); slots_[next].value; next = (next + 1) & mask()) {
+      const std::size_t home = slotOf(slots_[next].id);
+      const bool stays = hole <= next ? (hole < home && home <= next) : (hole < home || home <= next);
+      if (stays) continue;
+      slots_[hole] = std::move(slots_[next]);
+      hole = next;
+    }
+    --size_;
+    return true;
+  }
+
+  void clear() noexcept {
+    const std::vector<Slot> released = std::exchange(slots_, {});
+    size_ = 0;
+  }
+
+  // Calls visit(id, handle) for every entry; `visit` must not change the table.
+  template <class Visit>
+  void forEach(Visit&& visit) {
+    for (Slot& slot : slots_) {
+      if (slot.value) visit(static_cast<const Uuid&>(slot.id), slot.value);
+    }
+  }
+
+ private:
+  struct Slot {
+    Uuid id{};
+    Handle value{};
+  };
+
+  std::size_t mask() const noexcept { return slots_.size() - 1; }
+
+  std::size_t slotOf(const Uuid& id) const noexcept {
+    std::uint64_t low;
+    std::uint64_t high;
+    std::memcpy(&low, id.data, 8);
+    std::memcpy(&high, id.data + 8, 8);
+    return static_cast<std::size_t>(mix(low ^ mix(high ^ seed_))) & mask();
+  }
+
+  // A bijective finaliser: every input bit reaches every output bit.
+  static std::uint64_t mix(std::uint64_t x) noexcept {
+    x ^= x >> 33;
+    x *= 0xff51afd7ed558ccdULL;
+    x ^= x >> 33;
+    x *= 0xc4ceb9fe1a85ec53ULL;
+    x ^= x >> 33;
+    return x;
+  }
+
+  // The slot that holds `id`, or the free slot that ends its run.
+  Slot& probe(const Uuid& id) noexcept {
+    for (std::size_t at = slotOf(id);; at = (at + 1) & mask()) {
+      Slot& slot = slots_[at];
+      if (!slot.value || slot.id == id) return slot;
+    }
+  }
+
+  // Keeps the load at most one half, so runs stay short.
+  void reserveOneMore() {
+    if (2 * (size_ + 1) <= slots_.size()) return;
+    std::vector<Slot> old = std::exchange(slots_, std::vector<Slot>(slots_.empty() ? 16 : 2 * slots_.size()));
+    for (Slot& slot : old) {
+      if (slot.value) probe(slot.id) = std::move(slot);
+    }
+  }
+
+  std::vector<Slot> slots_;
+  std::size_t size_ = 0;
+  std::uint64_t seed_;
+};
+
+}  // namespace qf::zero::internal
