@@ -5,7 +5,7 @@
 #pragma once
 
 #include "qf/zero/core/internal/element_impl.h"
-#include "qf/zero/core/internal/uuid_table.h"
+#include "qf/zero/core/internal/flat_table.h"
 #include "qf/zero/core/listener.h"
 #include "qf/zero/core/model.h"
 #include "qf/zero/core/query.h"
@@ -153,7 +153,7 @@ class ModelImpl final : public RefCounted {
   Uuid uuid_;
   ModelConstellation constellation_;
   std::u16string uri_;
-  internal::UuidTable<IntrusivePtr<ModelElement::Impl>> elements_;
+  internal::FlatTable<Uuid, IntrusivePtr<ModelElement::Impl>> elements_;
   std::map<std::uint64_t, ModelElement::Impl*> topLevel_;
   std::unordered_map<const void*, std::map<std::uint64_t, ModelElement::Impl*>> instances_;
   // Proxies made for elements not resident here; dropped once the element arrives.

@@ -6,6 +6,7 @@
 // keyed by a property of the target.
 #pragma once
 
+#include "qf/zero/core/internal/flat_table.h"
 #include "qf/zero/core/map_key.h"
 #include "qf/zero/core/owned_collection.h"
 
@@ -121,27 +122,39 @@ struct ReferenceStore<T, std::vector<T>> {
   static constexpr bool ordered = true;
   static constexpr bool keyed = false;
   std::vector<T> items;
-  std::unordered_map<const ModelElement::Impl*, std::size_t> counts;  // fast membership
+  FlatTable<const ModelElement::Impl*, std::size_t> counts;  // fast membership: occurrences
 
-  bool contains(const ModelElement::Impl* e) const { return counts.count(e) != 0; }
+  bool contains(const ModelElement::Impl* e) const { return counts.find(e) != nullptr; }
   bool insert(std::size_t position, const T& e, const MapKey&) {
     items.insert(
         position >= items.size() ? items.end() : items.begin() + static_cast<std::ptrdiff_t>(position), e);
-    ++counts[e.getImpl()];
+    if (std::size_t* count = counts.find(e.getImpl())) {
+      ++*count;
+    } else {
+      counts.tryInsert(e.getImpl(), 1);
+    }
     return true;
   }
   bool erase(const ModelElement::Impl* e) {
-    auto it = counts.find(e);
-    if (it == counts.end()) return false;
-    if (--it->second == 0) counts.erase(it);
+    if (!uncount(e)) return false;
     items.erase(std::find_if(items.begin(), items.end(), [e](const T& x) { return x.getImpl() == e; }));
     return true;
   }
   void eraseAt(std::size_t position) {
     const auto it = items.begin() + static_cast<std::ptrdiff_t>(position);
-    if (auto count = counts.find(it->getImpl()); count != counts.end() && --count->second == 0)
-      counts.erase(count);
+    uncount(it->getImpl());
     items.erase(it);
+  }
+  // One occurrence fewer of `e`; false when it had none.
+  bool uncount(const ModelElement::Impl* e) {
+    std::size_t* count = counts.find(e);
+    if (count == nullptr) return false;
+    if (*count == 1) {
+      counts.erase(e);  // a zero count would mark the slot free before the table knew
+    } else {
+      --*count;
+    }
+    return true;
   }
   std::optional<std::size_t> indexOf(const ModelElement::Impl* e) const {
     if (!contains(e)) return std::nullopt;

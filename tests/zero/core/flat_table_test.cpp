@@ -1,7 +1,7 @@
-// The model's table of elements by UUID against std::unordered_map, on seeded random
+// The open-addressed table against std::unordered_map: a model's elements by UUID, on seeded random
 // operations over random and over sequential UUIDs (the ones hand-made documents use), with
 // the table's hash keyed and unkeyed.
-#include "qf/zero/core/internal/uuid_table.h"
+#include "qf/zero/core/internal/flat_table.h"
 
 #include <gtest/gtest.h>
 
@@ -17,7 +17,7 @@
 namespace {
 
 using qf::zero::Uuid;
-using Table = qf::zero::internal::UuidTable<std::shared_ptr<int>>;
+using Table = qf::zero::internal::FlatTable<Uuid, std::shared_ptr<int>>;
 
 Uuid randomUuid(std::mt19937_64& random) {
   Uuid id{};
@@ -38,9 +38,9 @@ struct UuidHash {
   }
 };
 
-class UuidTableProperty : public ::testing::TestWithParam<std::tuple<unsigned, bool, std::uint64_t>> {};
+class FlatTableProperty : public ::testing::TestWithParam<std::tuple<unsigned, bool, std::uint64_t>> {};
 
-TEST_P(UuidTableProperty, AgreesWithAStandardMap) {
+TEST_P(FlatTableProperty, AgreesWithAStandardMap) {
   const auto [seed, sequential, tableSeed] = GetParam();
   SCOPED_TRACE("seed " + std::to_string(seed));
   std::mt19937_64 random(seed);
@@ -92,13 +92,43 @@ TEST_P(UuidTableProperty, AgreesWithAStandardMap) {
   EXPECT_EQ(table.find(pool.front()), nullptr);
 }
 
-INSTANTIATE_TEST_SUITE_P(Seeds, UuidTableProperty,
+INSTANTIATE_TEST_SUITE_P(Seeds, FlatTableProperty,
                          ::testing::Combine(::testing::Values(1u, 2u, 3u), ::testing::Bool(),
                                             ::testing::Values(std::uint64_t{0},
                                                               std::uint64_t{0x9e3779b97f4a7c15})));
 
+// Occurrence counts by pointer, as a sequence counts its members: zero marks a free slot.
+TEST(FlatTable, CountsByPointerAgreeWithAStandardMap) {
+  std::mt19937_64 random(7);
+  const std::vector<int> objects(2000);
+  qf::zero::internal::FlatTable<const int*, std::size_t> counts;
+  std::unordered_map<const int*, std::size_t> expected;
+  for (int step = 0; step < 60000; ++step) {
+    const int* key = &objects[random() % objects.size()];
+    std::size_t* count = counts.find(key);
+    ASSERT_EQ(count != nullptr, expected.count(key) == 1) << "step " << step;
+    if (random() % 2 == 0) {
+      if (count != nullptr) {
+        ++*count;
+      } else {
+        counts.tryInsert(key, 1);
+      }
+      ++expected[key];
+    } else if (count != nullptr) {
+      if (*count == 1) {
+        ASSERT_TRUE(counts.erase(key));
+      } else {
+        --*count;
+      }
+      if (--expected[key] == 0) expected.erase(key);
+    }
+    ASSERT_EQ(counts.size(), expected.size());
+  }
+  for (const auto& [key, count] : expected) ASSERT_EQ(*counts.find(key), count);
+}
+
 // Erasing releases the handle only once the table is whole: the handle's end may read it.
-TEST(UuidTable, AHandleReleasedByEraseMayReadTheTable) {
+TEST(FlatTable, AHandleReleasedByEraseMayReadTheTable) {
   Table table;
   for (std::uint32_t i = 0; i < 100; ++i) table.tryInsert(sequentialUuid(i), std::make_shared<int>(int(i)));
   std::size_t seenSize = 0;

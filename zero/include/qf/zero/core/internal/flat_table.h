@@ -1,14 +1,16 @@
-// UuidTable: a map from UUIDs to nullable handles (an element by its UUID), held in one
-// array probed linearly.
+// FlatTable: a map held in one array probed linearly, for the framework's hot look-ups (a
+// model's elements by UUID, a collection's members by element).
 //
 // A model looks its elements up by UUID on every creation, refresh and reference it reads:
 // a node-based map there costs several cache misses an operation once the model outgrows
 // the cache; here an operation touches one or two neighbouring slots.
 //
-// Contracts: a null value marks a free slot, so a null value is never stored (inserting one
-// is refused). The hash is keyed with a seed drawn per table, so a peer that chooses UUIDs
-// cannot choose their slots; the order of forEach follows the slots and is unspecified.
-// Not thread-safe, as the model that holds it.
+// Contracts: a value that converts to false (a null handle, a zero count) marks a free
+// slot, so such a value is never stored (inserting one is refused; a value changed through
+// find must not become one: erase instead). Keys are UUIDs or
+// pointers. The hash is keyed with a seed given per table: a table of UUIDs that a peer
+// may choose is given a random one, so that the peer cannot choose their slots. The order
+// of forEach follows the slots and is unspecified. Not thread-safe.
 #pragma once
 
 #include "qf/zero/core/uuid.h"
@@ -21,16 +23,39 @@
 
 namespace qf::zero::internal {
 
-template <class Handle>
-class UuidTable {
+// A bijective finaliser: every input bit reaches every output bit.
+constexpr std::uint64_t mixBits(std::uint64_t x) noexcept {
+  x ^= x >> 33;
+  x *= 0xff51afd7ed558ccdULL;
+  x ^= x >> 33;
+  x *= 0xc4ceb9fe1a85ec53ULL;
+  x ^= x >> 33;
+  return x;
+}
+
+inline std::uint64_t flatTableHash(const Uuid& id, std::uint64_t seed) noexcept {
+  std::uint64_t low;
+  std::uint64_t high;
+  std::memcpy(&low, id.data, 8);
+  std::memcpy(&high, id.data + 8, 8);
+  return mixBits(low ^ mixBits(high ^ seed));
+}
+
+template <class T>
+std::uint64_t flatTableHash(const T* pointer, std::uint64_t seed) noexcept {
+  return mixBits(reinterpret_cast<std::uintptr_t>(pointer) ^ seed);
+}
+
+template <class Key, class Handle>
+class FlatTable {
  public:
   // `seed` keys the hash; any value works, a random one resists chosen collisions.
-  explicit UuidTable(std::uint64_t seed = 0) : seed_(seed) {}
+  explicit FlatTable(std::uint64_t seed = 0) : seed_(seed) {}
 
   std::size_t size() const noexcept { return size_; }
   bool empty() const noexcept { return size_ == 0; }
 
-  Handle* find(const Uuid& id) noexcept {
+  Handle* find(const Key& id) noexcept {
     if (size_ == 0) return nullptr;
     for (std::size_t at = slotOf(id);; at = (at + 1) & mask()) {
       Slot& slot = slots_[at];
@@ -38,10 +63,10 @@ class UuidTable {
       if (slot.id == id) return &slot.value;
     }
   }
-  const Handle* find(const Uuid& id) const noexcept { return const_cast<UuidTable*>(this)->find(id); }
+  const Handle* find(const Key& id) const noexcept { return const_cast<FlatTable*>(this)->find(id); }
 
   // Stores `value` under `id` unless `id` is taken or `value` is null; true when stored.
-  bool tryInsert(const Uuid& id, Handle value) {
+  bool tryInsert(const Key& id, Handle value) {
     if (!value) return false;
     reserveOneMore();
     Slot& slot = probe(id);
@@ -53,7 +78,7 @@ class UuidTable {
   }
 
   // Stores `value` under `id`, replacing what `id` held. A null `value` erases `id`.
-  void insertOrAssign(const Uuid& id, Handle value) {
+  void insertOrAssign(const Key& id, Handle value) {
     if (!value) {
       erase(id);
       return;
@@ -68,7 +93,7 @@ class UuidTable {
   }
 
   // Removes `id`; false when it was not there.
-  bool erase(const Uuid& id) noexcept {
+  bool erase(const Key& id) noexcept {
     if (size_ == 0) return false;
     std::size_t hole = slotOf(id);
     for (;; hole = (hole + 1) & mask()) {
@@ -77,14 +102,15 @@ class UuidTable {
     }
     // Released once the table is whole again: releasing may end an element, whose ending
     // may look the table up.
-    const Handle released = std::move(slots_[hole].value);
+    [[maybe_unused]] const Handle released = std::exchange(slots_[hole].value, Handle());
     // Backward shift: each later slot of the run moves into the hole unless the hole lies
     // before its home, so every lookup still meets its key before a free slot.
     for (std::size_t next = (hole + 1) & mask(); slots_[next].value; next = (next + 1) & mask()) {
       const std::size_t home = slotOf(slots_[next].id);
       const bool stays = hole <= next ? (hole < home && home <= next) : (hole < home || home <= next);
       if (stays) continue;
-      slots_[hole] = std::move(slots_[next]);
+      slots_[hole].id = slots_[next].id;
+      slots_[hole].value = std::exchange(slots_[next].value, Handle());
       hole = next;
     }
     --size_;
@@ -92,7 +118,7 @@ class UuidTable {
   }
 
   void clear() noexcept {
-    const std::vector<Slot> released = std::exchange(slots_, {});
+    [[maybe_unused]] const std::vector<Slot> released = std::exchange(slots_, {});
     size_ = 0;
   }
 
@@ -100,38 +126,24 @@ class UuidTable {
   template <class Visit>
   void forEach(Visit&& visit) {
     for (Slot& slot : slots_) {
-      if (slot.value) visit(static_cast<const Uuid&>(slot.id), slot.value);
+      if (slot.value) visit(static_cast<const Key&>(slot.id), slot.value);
     }
   }
 
  private:
   struct Slot {
-    Uuid id{};
+    Key id{};
     Handle value{};
   };
 
   std::size_t mask() const noexcept { return slots_.size() - 1; }
 
-  std::size_t slotOf(const Uuid& id) const noexcept {
-    std::uint64_t low;
-    std::uint64_t high;
-    std::memcpy(&low, id.data, 8);
-    std::memcpy(&high, id.data + 8, 8);
-    return static_cast<std::size_t>(mix(low ^ mix(high ^ seed_))) & mask();
-  }
-
-  // A bijective finaliser: every input bit reaches every output bit.
-  static std::uint64_t mix(std::uint64_t x) noexcept {
-    x ^= x >> 33;
-    x *= 0xff51afd7ed558ccdULL;
-    x ^= x >> 33;
-    x *= 0xc4ceb9fe1a85ec53ULL;
-    x ^= x >> 33;
-    return x;
+  std::size_t slotOf(const Key& id) const noexcept {
+    return static_cast<std::size_t>(flatTableHash(id, seed_)) & mask();
   }
 
   // The slot that holds `id`, or the free slot that ends its run.
-  Slot& probe(const Uuid& id) noexcept {
+  Slot& probe(const Key& id) noexcept {
     for (std::size_t at = slotOf(id);; at = (at + 1) & mask()) {
       Slot& slot = slots_[at];
       if (!slot.value || slot.id == id) return slot;
