@@ -5,6 +5,10 @@
 #include "kiv/metamodel/commit_impl.h"
 #include "kiv/metamodel/delta_impl.h"
 
+#include <algorithm>
+#include <utility>
+#include <vector>
+
 namespace kiv {
 
 namespace {
@@ -51,7 +55,14 @@ class Diff3Result {
 // settled on its own, so the maps are walked in any order.
 void compareBaseElements(const ComposedState& base, const ComposedState& ours, const ComposedState& theirs,
                          Diff3Result& result) {
-  for (const auto& [uuid, b] : base.current) {
+  // In UUID order, the order of the result's maps: each entry then goes last in its map.
+  std::vector<const history::StateEntries::value_type*> inOrder;
+  inOrder.reserve(base.current.size());
+  for (const auto& entry : base.current) inOrder.push_back(&entry);
+  std::sort(inOrder.begin(), inOrder.end(), [](const auto* a, const auto* b) { return a->first < b->first; });
+  for (const auto* entry : inOrder) {
+    const Uuid& uuid = entry->first;
+    const ObjectStorage& b = entry->second;
     const ObjectStorage o = ours.currentOf(uuid);
     const ObjectStorage t = theirs.currentOf(uuid);
     if (!o) {

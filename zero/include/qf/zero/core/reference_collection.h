@@ -219,9 +219,17 @@ struct ReferenceStore<T, std::map<K, T>> {
   bool contains(const ModelElement::Impl* e, const MapKey& key) const {
     return locate(e, key) != items.end();
   }
+  // Keys past the last one (items added in key order, as a history writes its states) go
+  // last without a walk down the tree.
   bool insert(std::size_t, const T& e, const MapKey& key) {
-    return items.emplace(mapKeyAs<K>(key), e).second;
+    K typed = mapKeyAs<K>(key);
+    if (isPastLast(typed)) {
+      items.emplace_hint(items.end(), std::move(typed), e);
+      return true;
+    }
+    return items.emplace(std::move(typed), e).second;
   }
+  bool isPastLast(const K& key) const { return items.empty() || items.rbegin()->first < key; }
   bool erase(const ModelElement::Impl* e, const MapKey& key) {
     auto it = locate(e, key);
     if (it == items.end()) return false;
@@ -252,7 +260,9 @@ struct ReferenceStore<T, std::map<K, T>> {
     for (const auto& kv : items) f(kv.second);
   }
   ModelElement findByKey(const MapKey& key) const {
-    auto it = items.find(mapKeyAs<K>(key));
+    const K typed = mapKeyAs<K>(key);
+    if (isPastLast(typed)) return {};
+    auto it = items.find(typed);
     return it == items.end() ? ModelElement() : ModelElement(it->second);
   }
 };
