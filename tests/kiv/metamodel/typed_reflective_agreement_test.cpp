@@ -182,6 +182,8 @@ TEST(GeneratedAccess, TypedAndReflectiveAccessAgreeForEveryProperty) {
     }
     EXPECT_EQ(row.typedGet(element), sample);
     EXPECT_EQ(element.getPropertyValue(property), sample);
+    // The key a map would file the element under, read from the member or through a Value.
+    EXPECT_EQ(element->basicGetMapKey(property), qf::zero::mapKeyFromValue(element->basicGetValue(property)));
     if (property->isReadOnly()) continue;
 
     element.setPropertyValue(property, Value());

@@ -153,3 +153,14 @@ def package_getter(item):
     if isinstance(item, Operation):
         return f"get{item.owner.name}_{item.ident}_operation"
     return f"get{item.name}"
+
+
+# The member types a map key holds as they are (the alternatives of qf::zero::MapKey).
+_MAP_KEY_TYPES = {"std::u16string", "bool", "int", "qf::zero::Uuid"}
+
+
+def map_key_properties(cls):
+    """The single attributes of a class whose value can key a map, read without a Value."""
+    return [p for p in cls.properties
+            if not p.many and not p.is_reference and not p.held_as_text and p.type is not None
+            and value_type(p.type) in _MAP_KEY_TYPES]

@@ -2,8 +2,8 @@
 
 from . import files
 from .cpp import (by_value, collection_alias, collection_type, default_initializer, getter_return, handle_base,
-                  impl_base, member, member_type, ns_close, ns_open, op_call_args, op_params, package_getter, param,
-                  result_decl, u16)
+                  impl_base, map_key_properties, member, member_type, ns_close, ns_open, op_call_args, op_params,
+                  package_getter, param, result_decl, u16)
 
 QZ = "qf::zero"
 
@@ -218,6 +218,8 @@ def _impl_class(d, cls):
               f"  {QZ}::AbstractOwnedCollection* basicGetCollection(const {QZ}::meta::Property& property) const override;",
               *([f"  const {QZ}::JsonText* basicGetHeldText(const {QZ}::meta::Property& property) const override;"]
                 if any(p.held_as_text for p in raw) else []),
+              *([f"  {QZ}::MapKey basicGetMapKey(const {QZ}::meta::Property& property) const override;"]
+                if map_key_properties(cls) else []),
               f"  std::unique_ptr<{QZ}::ModelElement::Impl::Storage> createStorage() const override;",
               f"  void copyValue({QZ}::ModelElement::Impl::Storage* storage, int index) const override;",
               f"  void restoreFromStorage({QZ}::ModelElement::Impl::Storage* storage, bool collections) override;"]

@@ -3,7 +3,7 @@ old-value slots."""
 
 from . import files
 from .emit_class import json_include, referenced_impl_includes
-from .cpp import impl_base, member, member_type, ns_close, ns_open, package_getter, value_type
+from .cpp import impl_base, map_key_properties, member, member_type, ns_close, ns_open, package_getter, value_type
 
 QZ = "qf::zero"
 
@@ -21,6 +21,13 @@ def _wrap(p, expr):
     if p.held_as_text:
         return f"{QZ}::Value::createPrimitiveValue(property, {expr}.parse())"
     return f"{QZ}::Value::createPrimitiveValue(property, {expr})"
+
+
+def _map_key(p):
+    m = member(p)
+    if p.kind == "optional":
+        return f"{m} ? {QZ}::MapKey(*{m}) : {QZ}::MapKey()"
+    return f"{QZ}::MapKey({m})"
 
 
 def _dispatch(d, cls, props, body, fallback):
@@ -65,6 +72,11 @@ def reflection_source(d, cls):
         lines += ["}", "", f"const {QZ}::JsonText* {n}::Impl::basicGetHeldText(const {QZ}::meta::Property& property) const {{"]
         lines += _dispatch(d, cls, held, lambda p: [f"return &{member(p)};"],
                            f"  return {base}::basicGetHeldText(property);")
+    keyed = map_key_properties(cls)
+    if keyed:
+        lines += ["}", "", f"{QZ}::MapKey {n}::Impl::basicGetMapKey(const {QZ}::meta::Property& property) const {{"]
+        lines += _dispatch(d, cls, keyed, lambda p: [f"return {_map_key(p)};"],
+                           f"  return {base}::basicGetMapKey(property);")
     lines += ["}", "",
               f"{QZ}::AbstractOwnedCollection* {n}::Impl::basicGetCollection(const {QZ}::meta::Property& property) const {{"]
     lines += _dispatch(d, cls, many, lambda p: [f"return const_cast<{p.cap}Collection*>(&{member(p)});"],

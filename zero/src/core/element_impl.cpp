@@ -622,4 +622,8 @@ void ModelElement::destroy() { impl_->destroy(); }
 
 const JsonText* ModelElement::Impl::basicGetHeldText(const meta::Property&) const { return nullptr; }
 
+MapKey ModelElement::Impl::basicGetMapKey(const meta::Property& property) const {
+  return mapKeyFromValue(basicGetValue(property));
+}
+
 }  // namespace qf::zero

@@ -21,7 +21,7 @@ bool ReferenceCollection::isMapInterface() const noexcept { return property_->is
 MapKey ReferenceCollection::keyOf(const ModelElement& element) const {
   const meta::Property key = property_->getQualifiedBy();
   if (!key || !element || element.isProxy()) return MapKey();
-  return mapKeyFromValue(element->basicGetValue(key));
+  return element->basicGetMapKey(key);
 }
 
 void ReferenceCollection::insert(std::size_t position, const ModelElement& element) {

@@ -12,6 +12,7 @@
 #pragma once
 
 #include "qf/zero/core/fwd.h"
+#include "qf/zero/core/map_key.h"
 #include "qf/zero/core/model_element.h"
 #include "qf/zero/core/proxy_id.h"
 #include "qf/zero/core/ref_counted.h"
@@ -142,6 +143,9 @@ class ModelElement::Impl : public RefCounted {
   // writer of text copies it instead of parsing and writing it again. Null for any other
   // property (the default).
   virtual const JsonText* basicGetHeldText(const meta::Property& property) const;
+  // mapKeyFromValue(basicGetValue(property)), the key this element has in a map keyed by
+  // `property`; typed classes read it from their member without making a Value.
+  virtual MapKey basicGetMapKey(const meta::Property& property) const;
   // Every property of the class (inherited first), in index order.
   const std::vector<meta::Property>& allProperties() const;
 
