@@ -42,20 +42,8 @@ Transaction TransactionFactory::beginTransaction(bool savepoint) const {
   return model_->beginTransaction(savepoint);
 }
 
-namespace {
-
-// A seed for a table's hash: random, so that no peer can choose colliding UUIDs.
-std::uint64_t randomSeed() {
-  const Uuid random = generateNewUuid();
-  std::uint64_t seed;
-  std::memcpy(&seed, random.data, sizeof seed);
-  return seed;
-}
-
-}  // namespace
-
 ModelImpl::ModelImpl(const Uuid& id, ModelConstellation constellation)
-    : uuid_(id), constellation_(constellation), elements_(randomSeed()) {}
+    : uuid_(id), constellation_(constellation), elements_(internal::randomTableSeed()) {}
 
 ModelImpl::~ModelImpl() {
   // Every element outlives its model only as an invalid shell: break the references

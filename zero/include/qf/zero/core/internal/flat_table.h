@@ -41,6 +41,14 @@ inline std::uint64_t flatTableHash(const Uuid& id, std::uint64_t seed) noexcept 
   return mixBits(low ^ mixBits(high ^ seed));
 }
 
+// A seed no peer can predict, for a table keyed by UUIDs that a peer may choose.
+inline std::uint64_t randomTableSeed() {
+  const Uuid random = generateNewUuid();
+  std::uint64_t seed;
+  std::memcpy(&seed, random.data, sizeof seed);
+  return seed;
+}
+
 template <class T>
 std::uint64_t flatTableHash(const T* pointer, std::uint64_t seed) noexcept {
   return mixBits(reinterpret_cast<std::uintptr_t>(pointer) ^ seed);
@@ -52,6 +60,7 @@ class FlatTable {
   // `seed` keys the hash; any value works, a random one resists chosen collisions.
   explicit FlatTable(std::uint64_t seed = 0) : seed_(seed) {}
 
+  std::uint64_t seed() const noexcept { return seed_; }
   std::size_t size() const noexcept { return size_; }
   bool empty() const noexcept { return size_ == 0; }
 
@@ -92,6 +101,13 @@ class FlatTable {
     slot.value = std::move(value);
   }
 
+  // Makes room for `count` entries in all without growing again.
+  void reserve(std::size_t count) {
+    std::size_t wanted = slots_.empty() ? 16 : slots_.size();
+    while (wanted < 2 * count) wanted *= 2;
+    if (wanted > slots_.size()) rehash(wanted);
+  }
+
   // Removes `id`; false when it was not there.
   bool erase(const Key& id) noexcept {
     if (size_ == 0) return false;
@@ -129,6 +145,12 @@ class FlatTable {
       if (slot.value) visit(static_cast<const Key&>(slot.id), slot.value);
     }
   }
+  template <class Visit>
+  void forEach(Visit&& visit) const {
+    for (const Slot& slot : slots_) {
+      if (slot.value) visit(slot.id, slot.value);
+    }
+  }
 
  private:
   struct Slot {
@@ -153,7 +175,11 @@ class FlatTable {
   // Keeps the load at most one half, so runs stay short.
   void reserveOneMore() {
     if (2 * (size_ + 1) <= slots_.size()) return;
-    std::vector<Slot> old = std::exchange(slots_, std::vector<Slot>(slots_.empty() ? 16 : 2 * slots_.size()));
+    rehash(slots_.empty() ? 16 : 2 * slots_.size());
+  }
+
+  void rehash(std::size_t slotCount) {
+    std::vector<Slot> old = std::exchange(slots_, std::vector<Slot>(slotCount));
     for (Slot& slot : old) {
       if (slot.value) probe(slot.id) = std::move(slot);
     }
