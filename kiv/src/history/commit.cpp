@@ -127,9 +127,9 @@ Delta Commit::Impl::getSnapshot() const {
   const history::ComposedState state = history::snapshotState(self(this));
   const Delta snapshot = Delta::create(getModel());
   auto& current = snapshot->getCurrentMutable();
-  for (const auto& [uuid, storage] : state.current) current.add(storage);
+  for (const auto& [uuid, storage] : history::inUuidOrder(state.current)) current.add(*storage);
   auto& previous = snapshot->getPreviousMutable();
-  for (const auto& [uuid, storage] : state.previous) previous.add(storage);
+  for (const auto& [uuid, storage] : history::inUuidOrder(state.previous)) previous.add(*storage);
   snapshot->setIsSnapshot(true);
   transaction.commit();
   return snapshot;

@@ -5,24 +5,38 @@
 
 #include "kiv/metamodel/commit_impl.h"
 #include "kiv/metamodel/delta_impl.h"
+#include "qf/zero/core/internal/flat_table.h"
 
-#include <boost/functional/hash.hpp>
-
-#include <unordered_map>
+#include <utility>
 #include <vector>
 
 namespace kiv::history {
 
-using StateEntries = std::unordered_map<qf::zero::Uuid, ObjectStorage, boost::hash<qf::zero::Uuid>>;
+// Entries by element UUID, never empty handles. A state of a whole model is read once per
+// element and dropped: one array serves it better than a node per entry. Its UUIDs may
+// come from a peer, so its hash is keyed with an unpredictable seed.
+using StateEntries = qf::zero::internal::FlatTable<qf::zero::Uuid, ObjectStorage>;
 
 struct ComposedState {
+  ComposedState() : current(qf::zero::internal::randomTableSeed()), previous(current.seed()) {}
+
   StateEntries current, previous;
   bool isSnapshot = false;
 
   // The entry for `uuid`, or an empty handle.
-  ObjectStorage currentOf(const qf::zero::Uuid& uuid) const;
-  ObjectStorage previousOf(const qf::zero::Uuid& uuid) const;
+  const ObjectStorage& currentOf(const qf::zero::Uuid& uuid) const { return entryOf(current, uuid); }
+  const ObjectStorage& previousOf(const qf::zero::Uuid& uuid) const { return entryOf(previous, uuid); }
+
+  static const ObjectStorage& entryOf(const StateEntries& entries, const qf::zero::Uuid& uuid) {
+    static const ObjectStorage none;
+    const ObjectStorage* found = entries.find(uuid);
+    return found ? *found : none;
+  }
 };
+
+// The entries in ascending UUID order, the order of a delta's maps: added in this order,
+// each goes last in its map.
+std::vector<std::pair<qf::zero::Uuid, const ObjectStorage*>> inUuidOrder(const StateEntries& entries);
 
 // The entries of Delta::Impl::compose(deltas), most recent first. Null and destroyed
 // deltas count as empty; so does an empty sequence.

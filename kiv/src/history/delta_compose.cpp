@@ -7,6 +7,9 @@
 #include <boost/functional/hash.hpp>
 
 #include <algorithm>
+#include <bit>
+#include <cstdint>
+#include <cstring>
 #include <unordered_map>
 #include <unordered_set>
 
@@ -107,12 +110,14 @@ class StateSink {
  public:
   explicit StateSink(history::ComposedState& state) : state_(state) {}
   ObjectStorage current(const Uuid& uuid) const { return state_.currentOf(uuid); }
-  bool hasPrevious(const Uuid& uuid) const { return state_.previous.count(uuid) != 0; }
+  bool hasPrevious(const Uuid& uuid) const { return state_.previous.find(uuid) != nullptr; }
   void addCurrentUnlessPresent(const Uuid& uuid, const ObjectStorage& storage) {
-    state_.current.try_emplace(uuid, storage);
+    state_.current.tryInsert(uuid, storage);
   }
   void removeCurrent(const Uuid& uuid, const ObjectStorage&) { state_.current.erase(uuid); }
-  void addPrevious(const Uuid& uuid, const ObjectStorage& storage) { state_.previous.emplace(uuid, storage); }
+  void addPrevious(const Uuid& uuid, const ObjectStorage& storage) {
+    state_.previous.tryInsert(uuid, storage);
+  }
   void markSnapshot() { state_.isSnapshot = true; }
 
  private:
@@ -163,14 +168,39 @@ Delta Delta::Impl::compose(const std::vector<Delta>& deltas) {
 
 namespace history {
 
-ObjectStorage ComposedState::currentOf(const Uuid& uuid) const {
-  const auto it = current.find(uuid);
-  return it != current.end() ? it->second : ObjectStorage();
+namespace {
+
+// A UUID's bytes as two numbers that order as the bytes do.
+std::pair<std::uint64_t, std::uint64_t> orderKey(const Uuid& uuid) noexcept {
+  std::uint64_t high;
+  std::uint64_t low;
+  std::memcpy(&high, uuid.data, sizeof high);
+  std::memcpy(&low, uuid.data + sizeof high, sizeof low);
+  if constexpr (std::endian::native == std::endian::little) {
+    high = __builtin_bswap64(high);
+    low = __builtin_bswap64(low);
+  }
+  return {high, low};
 }
 
-ObjectStorage ComposedState::previousOf(const Uuid& uuid) const {
-  const auto it = previous.find(uuid);
-  return it != previous.end() ? it->second : ObjectStorage();
+}  // namespace
+
+std::vector<std::pair<Uuid, const ObjectStorage*>> inUuidOrder(const StateEntries& entries) {
+  struct Keyed {
+    std::pair<std::uint64_t, std::uint64_t> key;
+    const Uuid* uuid;
+    const ObjectStorage* storage;
+  };
+  std::vector<Keyed> keyed;
+  keyed.reserve(entries.size());
+  entries.forEach([&](const Uuid& uuid, const ObjectStorage& storage) {
+    keyed.push_back({orderKey(uuid), &uuid, &storage});
+  });
+  std::sort(keyed.begin(), keyed.end(), [](const Keyed& a, const Keyed& b) { return a.key < b.key; });
+  std::vector<std::pair<Uuid, const ObjectStorage*>> ordered;
+  ordered.reserve(keyed.size());
+  for (const Keyed& entry : keyed) ordered.emplace_back(*entry.uuid, entry.storage);
+  return ordered;
 }
 
 ComposedState composeState(const std::vector<Delta>& deltas) {

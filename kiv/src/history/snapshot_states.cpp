@@ -5,8 +5,7 @@
 #include "kiv/metamodel/commit_impl.h"
 #include "kiv/metamodel/delta_impl.h"
 
-#include <boost/functional/hash.hpp>
-
+#include <cstdint>
 #include <limits>
 #include <optional>
 #include <vector>
@@ -80,19 +79,31 @@ std::pair<ObjectStorage, ObjectStorage> replay(const std::vector<Entry>& entries
 
 struct SnapshotStates::LineState {
   struct Element {
+    Uuid uuid;
     ObjectStorage newestAfter;  // null once a deletion is newer than every "after"
     bool created = false;
     std::vector<Entry> entries;  // only for an element with a "before" older than any creation
   };
-  std::unordered_map<Uuid, Element, boost::hash<Uuid>> elements;
+  // Elements in the order the line first names them, found by UUID through their position
+  // plus one: a state is copied at every checkpoint and read whole by every snapshot, so it
+  // is kept in two arrays rather than a node per element.
+  qf::zero::internal::FlatTable<Uuid, std::uint32_t> positions{qf::zero::internal::randomTableSeed()};
+  std::vector<Element> elements;
   std::size_t length = 0;
+
+  Element& elementOf(const Uuid& uuid) {
+    if (const std::uint32_t* position = positions.find(uuid)) return elements[*position - 1];
+    elements.push_back({uuid, {}, false, {}});
+    positions.tryInsert(uuid, static_cast<std::uint32_t>(elements.size()));
+    return elements.back();
+  }
 
   // The next newer delta of the line; null for a commit that recorded nothing.
   void absorb(const Delta& delta) {
     const std::size_t age = length++;
     if (!isLive(delta)) return;
     const auto take = [&](const Uuid& uuid, const ObjectStorage& before, const ObjectStorage& after) {
-      Element& element = elements[uuid];
+      Element& element = elementOf(uuid);
       if (!element.entries.empty() || (before && !element.created))
         element.entries.push_back({age, before, after});
       if (after && !before) element.created = true;
@@ -116,14 +127,14 @@ struct SnapshotStates::LineState {
     ComposedState state;
     state.isSnapshot = true;
     state.current.reserve(elements.size());
-    for (const auto& [uuid, element] : elements) {
+    for (const Element& element : elements) {
       if (element.entries.empty()) {
-        if (element.newestAfter) state.current.emplace(uuid, element.newestAfter);
+        state.current.tryInsert(element.uuid, element.newestAfter);
         continue;
       }
       const auto [current, previous] = replay(element.entries, length);
-      if (current) state.current.emplace(uuid, current);
-      if (previous) state.previous.emplace(uuid, previous);
+      state.current.tryInsert(element.uuid, current);
+      state.previous.tryInsert(element.uuid, previous);
     }
     return state;
   }

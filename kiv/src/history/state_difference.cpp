@@ -17,9 +17,10 @@ namespace {
 std::map<qf::zero::Uuid, ObjectStorage> liveEntriesAt(const Commit& commit) {
   std::map<qf::zero::Uuid, ObjectStorage> entries;
   if (!history::isLive(commit)) return entries;
-  for (const auto& [uuid, storage] : history::snapshotState(commit).current) {
-    if (history::isLive(storage)) entries.emplace(uuid, storage);
-  }
+  history::snapshotState(commit).current.forEach(
+      [&](const qf::zero::Uuid& uuid, const ObjectStorage& storage) {
+        if (history::isLive(storage)) entries.emplace(uuid, storage);
+      });
   return entries;
 }
 

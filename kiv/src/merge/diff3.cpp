@@ -56,15 +56,10 @@ class Diff3Result {
 void compareBaseElements(const ComposedState& base, const ComposedState& ours, const ComposedState& theirs,
                          Diff3Result& result) {
   // In UUID order, the order of the result's maps: each entry then goes last in its map.
-  std::vector<const history::StateEntries::value_type*> inOrder;
-  inOrder.reserve(base.current.size());
-  for (const auto& entry : base.current) inOrder.push_back(&entry);
-  std::sort(inOrder.begin(), inOrder.end(), [](const auto* a, const auto* b) { return a->first < b->first; });
-  for (const auto* entry : inOrder) {
-    const Uuid& uuid = entry->first;
-    const ObjectStorage& b = entry->second;
-    const ObjectStorage o = ours.currentOf(uuid);
-    const ObjectStorage t = theirs.currentOf(uuid);
+  for (const auto& [uuid, entry] : history::inUuidOrder(base.current)) {
+    const ObjectStorage& b = *entry;
+    const ObjectStorage& o = ours.currentOf(uuid);
+    const ObjectStorage& t = theirs.currentOf(uuid);
     if (!o) {
       if (!t || t == b) {
         result.deleted(b);
@@ -74,7 +69,7 @@ void compareBaseElements(const ComposedState& base, const ComposedState& ours, c
     } else if (o == b) {
       if (!t) {
         result.deleted(b);
-      } else if (const ObjectStorage p = base.previousOf(uuid)) {
+      } else if (const ObjectStorage& p = base.previousOf(uuid)) {
         // Ours left it alone: theirs is taken unseen, against the base's previous entry.
         result.updated(p, t);
       } else {
@@ -91,19 +86,24 @@ void compareBaseElements(const ComposedState& base, const ComposedState& ours, c
 // Step two: elements new on our side; step three: elements new on theirs only.
 void compareNewElements(const ComposedState& base, const ComposedState& ours, const ComposedState& theirs,
                         Diff3Result& result) {
-  for (const auto& [uuid, o] : ours.current) {
-    if (base.currentOf(uuid)) continue;
-    const ObjectStorage t = theirs.currentOf(uuid);
-    if (!t || t == o) {
-      result.created(o);
+  // Few elements are new: they are found in any order and settled in UUID order.
+  history::StateEntries newOfOurs(ours.current.seed()), newOfTheirs(ours.current.seed());
+  ours.current.forEach([&](const Uuid& uuid, const ObjectStorage& o) {
+    if (!base.currentOf(uuid)) newOfOurs.tryInsert(uuid, o);
+  });
+  theirs.current.forEach([&](const Uuid& uuid, const ObjectStorage& t) {
+    if (!base.currentOf(uuid) && !base.previousOf(uuid) && !ours.currentOf(uuid))
+      newOfTheirs.tryInsert(uuid, t);
+  });
+  for (const auto& [uuid, o] : history::inUuidOrder(newOfOurs)) {
+    const ObjectStorage& t = theirs.currentOf(uuid);
+    if (!t || t == *o) {
+      result.created(*o);
     } else {
-      result.conflict({}, o, t);
+      result.conflict({}, *o, t);
     }
   }
-  for (const auto& [uuid, t] : theirs.current) {
-    if (base.currentOf(uuid) || base.previousOf(uuid)) continue;
-    if (!ours.currentOf(uuid)) result.created(t);
-  }
+  for (const auto& [uuid, t] : history::inUuidOrder(newOfTheirs)) result.created(*t);
 }
 
 }  // namespace

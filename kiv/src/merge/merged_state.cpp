@@ -43,8 +43,7 @@ JsonValue MergedState::deletedEntry(const Uuid& uuid) const {
 }
 
 ObjectStorage MergedState::baseEntry(const Uuid& uuid) const {
-  const auto it = base_.find(uuid);
-  return it != base_.end() ? it->second : ObjectStorage();
+  return history::ComposedState::entryOf(base_, uuid);
 }
 
 void MergedState::put(const Uuid& uuid, JsonValue entry, std::vector<ObjectStorage> sameAs) {
