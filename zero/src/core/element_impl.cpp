@@ -97,22 +97,7 @@ void ModelElement::Impl::checkAssignable(const meta::Property& property, const V
   const meta::Type type = property->getType();
   if (property->isReference()) {
     if (!value.isElement()) reportException(qf0::messages::InvalidValue());
-    const ModelElement& target = value.getElement();
-    if (!target.isLive() && !target.isProxy()) reportException(qf0::messages::CannotAddNonExistentObject());
-    if (!target.getMetaClass().conformsTo(type)) {
-      reportException(qf0::messages::CannotAddIncompatibleTypes(type.getQualifiedName(),
-                                                                target.getMetaClass().getQualifiedName()));
-    }
-    if (!target.isProxy()) checkCompatibleModel(target.getImpl(), property);
-    if (property->isContainment()) {
-      if (target.isProxy()) reportException(qf0::messages::InvalidValue());
-      checkCircularContainment(target);
-    }
-    // Through a container-side reference the target becomes this element's container.
-    if (const meta::Property opposite = property->getOpposite(); opposite && opposite->isContainment()) {
-      if (target.isProxy()) reportException(qf0::messages::InvalidValue());
-      target->checkCircularContainment(ModelElement(const_cast<Impl*>(this)));
-    }
+    checkReferenceAssignable(property, value.getElement());
     return;
   }
   if (value.isElement()) {
@@ -125,6 +110,26 @@ void ModelElement::Impl::checkAssignable(const meta::Property& property, const V
   }
   if (auto primitive = elementCast<meta::PrimitiveType>(type); primitive && primitive->getTraits()) {
     if (value.heldType() != primitive->getTraits()->cppType()) reportException(qf0::messages::InvalidValue());
+  }
+}
+
+void ModelElement::Impl::checkReferenceAssignable(const meta::Property& property,
+                                                  const ModelElement& target) const {
+  const meta::Type type = property->getType();
+  if (!target.isLive() && !target.isProxy()) reportException(qf0::messages::CannotAddNonExistentObject());
+  if (!target.getMetaClass().conformsTo(type)) {
+    reportException(qf0::messages::CannotAddIncompatibleTypes(type.getQualifiedName(),
+                                                              target.getMetaClass().getQualifiedName()));
+  }
+  if (!target.isProxy()) checkCompatibleModel(target.getImpl(), property);
+  if (property->isContainment()) {
+    if (target.isProxy()) reportException(qf0::messages::InvalidValue());
+    checkCircularContainment(target);
+  }
+  // Through a container-side reference the target becomes this element's container.
+  if (const meta::Property opposite = property->getOpposite(); opposite && opposite->isContainment()) {
+    if (target.isProxy()) reportException(qf0::messages::InvalidValue());
+    target->checkCircularContainment(ModelElement(const_cast<Impl*>(this)));
   }
 }
 

@@ -27,7 +27,7 @@ MapKey ReferenceCollection::keyOf(const ModelElement& element) const {
 void ReferenceCollection::insert(std::size_t position, const ModelElement& element) {
   Operation operation(*this);
   if (!element) reportException(qf0::messages::CannotAddNonExistentObject());
-  owner_->checkAssignable(property_, Value::createElementValue(element, property_));
+  owner_->checkReferenceAssignable(property_, element);
   if (property_->isMap()) {
     if (ModelElement holder = basicFindByKey(keyOf(element)); holder) {
       if (holder == element) reportException(qf0::messages::CannotAddSecondObject());

@@ -228,6 +228,8 @@ class ModelElement::Impl : public RefCounted {
   void basicDetachFromModel();
   void checkModifiable() const;
   void checkAssignable(const meta::Property& property, const Value& value) const;
+  // checkAssignable of a reference property and a non-null target, without making a Value.
+  void checkReferenceAssignable(const meta::Property& property, const ModelElement& target) const;
   void setSingleReference(const meta::Property& property, const ModelElement& target, bool initializing);
   void setManyValued(const meta::Property& property, const Value& value);
   void destroySubtree(std::vector<Impl*>& subtree);
