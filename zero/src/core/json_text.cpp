@@ -10,6 +10,13 @@
 
 namespace qf::zero {
 
+namespace {
+
+// Spare room a taken text may keep rather than be copied into a buffer of its size.
+constexpr std::size_t kKeptSlack = 16;
+
+}  // namespace
+
 JsonText::JsonText() : text_("null") {}
 
 JsonText::JsonText(const nlohmann::ordered_json& value) {
@@ -25,7 +32,9 @@ JsonText::JsonText(const nlohmann::ordered_json& value) {
 JsonText JsonText::fromCompactText(std::string text) noexcept {
   JsonText result;
   result.text_ = std::move(text);
-  result.text_.shrink_to_fit();
+  // Text written into room reserved for it is kept as it is; a buffer that grew by
+  // doubling keeps only what it needs.
+  if (result.text_.capacity() > result.text_.size() + kKeptSlack) result.text_.shrink_to_fit();
   return result;
 }
 

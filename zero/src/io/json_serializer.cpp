@@ -177,7 +177,11 @@ class JSONSerializer::EntryWriter {
 
   // Appends the text of write(element).dump() to `out`; a value held as text is copied.
   void writeText(const ModelElement& element, std::string& out) {
-    const ClassPlan& plan = planFor(element.getMetaClass());
+    ClassPlan& plan = planFor(element.getMetaClass());
+    // An entry written alone gets the room its class's last entry took, and a little more,
+    // so that it is neither regrown nor copied to fit.
+    const bool alone = out.empty();
+    if (alone) out.reserve(plan.entryTextSize + kEntryTextSlack);
     out += plan.entryStart;
     appendQuotedUuid(out, element.getUuid());
     out += R"(,"content":{)";
@@ -212,6 +216,7 @@ class JSONSerializer::EntryWriter {
       first = false;
     }
     out += "}}";
+    if (alone) plan.entryTextSize = out.size();
   }
 
  private:
@@ -230,9 +235,11 @@ class JSONSerializer::EntryWriter {
     std::string typeName;
     std::string entryStart;  // {"type":"<typeName>","id":
     std::vector<PropertyPlan> properties;
+    std::size_t entryTextSize = 0;  // of the last entry written alone
   };
+  static constexpr std::size_t kEntryTextSlack = 8;
 
-  const ClassPlan& planFor(const meta::Class& metaClass) {
+  ClassPlan& planFor(const meta::Class& metaClass) {
     if (auto it = plans_.find(metaClass.getImpl()); it != plans_.end()) return it->second;
     ClassPlan plan;
     plan.typeName = toUtf8(metaClass.getQualifiedName());
@@ -305,7 +312,11 @@ class JSONSerializer::EntryWriter {
     }
     switch (plan.codec.kind) {
       case internal::AttributeKind::String:
-        appendJsonString(out, value.getValue<std::u16string>());
+        if (const std::u16string* text = value.peek<std::u16string>()) {
+          appendJsonString(out, *text);
+        } else {
+          appendJsonString(out, value.getValue<std::u16string>());
+        }
         break;
       case internal::AttributeKind::Integer: {
         char digits[16];

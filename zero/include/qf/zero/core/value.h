@@ -122,6 +122,12 @@ class Value {
   // AbstractOwnedCollection*) reads a collection view; the value does not own it.
   template <class T>
   T getValue() const;
+  // The held T itself, without a copy; null when the value holds no T (no conversion is
+  // tried). Valid while this value lives.
+  template <class T>
+  const T* peek() const noexcept {
+    return holds<T>() ? &static_cast<const TypedHolder<T>&>(*holder_).value : nullptr;
+  }
 
   friend bool operator==(const Value& a, const Value& b);
 
