@@ -3,8 +3,7 @@
 #include "history/history_support.h"
 #include "kiv/messages/messages.h"
 #include "kiv/metamodel/delta_impl.h"
-
-#include <boost/functional/hash.hpp>
+#include "qf/zero/core/internal/flat_table.h"
 
 #include <algorithm>
 #include <bit>
@@ -29,7 +28,7 @@ using qf::zero::Uuid;
 class Lifecycles {
  public:
   explicit Lifecycles(const std::vector<Delta>& deltas) {
-    std::unordered_set<Uuid, boost::hash<Uuid>> withPrevious;
+    std::unordered_set<Uuid, qf::zero::internal::KeyedUuidHash> withPrevious;
     for (std::size_t position = 0; position < deltas.size(); ++position) {
       if (!history::isLive(deltas[position])) continue;
       const Delta::Impl& delta = *deltas[position].getImpl();
@@ -72,8 +71,8 @@ class Lifecycles {
   }
 
  private:
-  std::unordered_map<Uuid, std::size_t, boost::hash<Uuid>> mostRecentDeletion_;
-  std::unordered_map<Uuid, std::size_t, boost::hash<Uuid>> oldestCreation_;
+  std::unordered_map<Uuid, std::size_t, qf::zero::internal::KeyedUuidHash> mostRecentDeletion_;
+  std::unordered_map<Uuid, std::size_t, qf::zero::internal::KeyedUuidHash> oldestCreation_;
 };
 
 // A null or destroyed delta counts as an empty one. The result is made in the model of

@@ -49,10 +49,10 @@ std::optional<ObjectStorage> FirstParentStates::find(const Commit& tip, const qf
   }
   lastMiss_ = Commit();
   if (!usable_) return std::nullopt;
-  const auto found = states_.find(element);
-  if (found == states_.end()) return ObjectStorage();
-  if (!found->second.isLive()) return std::nullopt;
-  return found->second;
+  const ObjectStorage* found = states_.find(element);
+  if (found == nullptr) return ObjectStorage();
+  if (!found->isLive()) return std::nullopt;
+  return *found;
 }
 
 void FirstParentStates::extendTo(const Commit& tip) {
@@ -94,9 +94,9 @@ bool FirstParentStates::absorb(const Commit& commit, bool nearest) {
   if (nearest && delta->getIsSnapshot()) states_.clear();
   for (const auto& [key, storage] : entries) {
     if (nearest) {
-      states_.insert_or_assign(key, storage);
+      states_.insertOrAssign(key, storage);
     } else {
-      states_.emplace(key, storage);
+      states_.tryInsert(key, storage);
     }
   }
   return true;

@@ -16,13 +16,11 @@
 
 #include "kiv/metamodel/commit.h"
 #include "kiv/metamodel/object_storage.h"
+#include "qf/zero/core/internal/flat_table.h"
 #include "qf/zero/core/uuid.h"
-
-#include <boost/functional/hash.hpp>
 
 #include <cstdint>
 #include <optional>
-#include <unordered_map>
 
 namespace qf::zero {
 class ModelImpl;
@@ -53,7 +51,8 @@ class FirstParentStates {
   Commit lastMiss_;                // the tip of the last question the index could not take
   bool usable_ = false;            // false: the tip's line holds a proxy
   std::uint64_t seenChanges_ = 0;  // the model's watched-change count when last in step
-  std::unordered_map<qf::zero::Uuid, ObjectStorage, boost::hash<qf::zero::Uuid>> states_;
+  // By element UUID, which a peer may choose: keyed with an unpredictable seed.
+  qf::zero::internal::FlatTable<qf::zero::Uuid, ObjectStorage> states_{qf::zero::internal::randomTableSeed()};
 };
 
 }  // namespace kiv::history

@@ -6,9 +6,8 @@
 #include "history/composed_state.h"
 #include "history/history_support.h"
 #include "kiv/metamodel/delta_impl.h"
+#include "qf/zero/core/internal/flat_table.h"
 #include "qf/zero/core/meta/framework_package.h"
-
-#include <boost/functional/hash.hpp>
 
 #include <nlohmann/json.hpp>
 
@@ -47,7 +46,7 @@ class MergedState {
   struct Rewrite {
     std::vector<ObjectStorage> sameAs;
   };
-  using Hash = boost::hash<qf::zero::Uuid>;
+  using Hash = qf::zero::internal::KeyedUuidHash;
 
   ObjectStorage baseEntry(const qf::zero::Uuid& uuid) const;
 

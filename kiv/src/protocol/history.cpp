@@ -7,6 +7,7 @@
 #include "kiv/protocol/history_text.h"
 #include "kiv/protocol/terminator_model_builder.h"
 #include "protocol/history_checks.h"
+#include "qf/zero/core/internal/flat_table.h"
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/report_exception.h"
@@ -209,7 +210,7 @@ void History::Impl::clear() {
 bool History::Impl::isEquivalent(const History& other) const {
   if (!isPresent(other)) return false;
   const auto identities = [](const DeltasCollection& deltas) {
-    std::unordered_set<qf::zero::Uuid, boost::hash<qf::zero::Uuid>> result;
+    std::unordered_set<qf::zero::Uuid, qf::zero::internal::KeyedUuidHash> result;
     for (const ModelElement& delta : deltas.getAllValuesAndProxies()) {
       result.insert(delta.isProxy() ? delta->getProxyId().elementId : delta.getUuid());
     }

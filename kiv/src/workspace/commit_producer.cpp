@@ -7,11 +7,10 @@
 #include "kiv/metamodel/delta_impl.h"
 #include "kiv/metamodel/local_repository_impl.h"
 #include "kiv/metamodel/workspace_impl.h"
+#include "qf/zero/core/internal/flat_table.h"
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/transaction.h"
 #include "qf/zero/io/json_change_report_synchronizer.h"
-
-#include <boost/functional/hash.hpp>
 
 #include <nlohmann/json.hpp>
 
@@ -41,7 +40,7 @@ void CommitProducer::Rewrite::clearModel() {
 }
 
 void CommitProducer::Rewrite::replaceState(const Delta& state) {
-  std::unordered_set<qf::zero::Uuid, boost::hash<qf::zero::Uuid>> kept;
+  std::unordered_set<qf::zero::Uuid, qf::zero::internal::KeyedUuidHash> kept;
   for (const auto& [uuid, storage] : state->getCurrent().container()) kept.insert(uuid);
   for (qf::zero::ModelElement element : producer_.model_->getInstances(
            qf::zero::ModelElement::metaClass(), qf::zero::query::SearchClassMatchMode::IncludeSubclasses)) {

@@ -1,5 +1,6 @@
 #include "qf/zero/core/uuid.h"
 
+#include "qf/zero/core/internal/flat_table.h"
 #include "qf/zero/core/text.h"
 
 #include <boost/uuid/name_generator_md5.hpp>
@@ -18,6 +19,15 @@ std::mt19937_64 seededEngine() {
 }
 
 }  // namespace
+
+namespace internal {
+
+std::uint64_t randomTableSeed() {
+  thread_local std::mt19937_64 engine = seededEngine();
+  return engine();
+}
+
+}  // namespace internal
 
 Uuid generateNewUuid() {
   thread_local std::mt19937_64 engine = seededEngine();

@@ -7,8 +7,6 @@
 #include "qf/zero/core/text.h"
 #include "qf/zero/io/json_constants.h"
 
-#include <boost/container_hash/hash.hpp>
-
 #include <nlohmann/json.hpp>
 
 #include <limits>
@@ -275,7 +273,7 @@ class JSONParser::Run {
   std::unordered_map<std::string, meta::Class> classes_;
   Model model_;
   std::vector<Entry> entries_;
-  std::unordered_map<Uuid, ModelElement, boost::hash<Uuid>> byUuid_;
+  std::unordered_map<Uuid, ModelElement, qf::zero::internal::KeyedUuidHash> byUuid_;
   std::unordered_map<const void*, std::unordered_map<std::string, PropertyPlan>> plans_;
   std::unordered_set<const void*> placed_;
 };

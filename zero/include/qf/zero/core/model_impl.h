@@ -11,8 +11,6 @@
 #include "qf/zero/core/query.h"
 #include "qf/zero/core/transaction.h"
 
-#include <boost/functional/hash.hpp>
-
 #include <cstdint>
 #include <functional>
 #include <map>
@@ -157,7 +155,7 @@ class ModelImpl final : public RefCounted {
   std::map<std::uint64_t, ModelElement::Impl*> topLevel_;
   std::unordered_map<const void*, std::map<std::uint64_t, ModelElement::Impl*>> instances_;
   // Proxies made for elements not resident here; dropped once the element arrives.
-  std::unordered_map<Uuid, IntrusivePtr<ModelElement::Impl>, boost::hash<Uuid>> proxies_;
+  std::unordered_map<Uuid, IntrusivePtr<ModelElement::Impl>, qf::zero::internal::KeyedUuidHash> proxies_;
   std::uint64_t nextSerial_ = 1;
   std::uint64_t watchedChanges_ = 0;
   std::unordered_map<const void*, std::shared_ptr<void>> attachments_;

@@ -41,13 +41,18 @@ inline std::uint64_t flatTableHash(const Uuid& id, std::uint64_t seed) noexcept 
   return mixBits(low ^ mixBits(high ^ seed));
 }
 
-// A seed no peer can predict, for a table keyed by UUIDs that a peer may choose.
-inline std::uint64_t randomTableSeed() {
-  const Uuid random = generateNewUuid();
-  std::uint64_t seed;
-  std::memcpy(&seed, random.data, sizeof seed);
-  return seed;
-}
+// A seed no peer can predict, for a table keyed by UUIDs that a peer may choose. Drawn
+// from a generator of its own: the one behind generateNewUuid shows its output to peers.
+std::uint64_t randomTableSeed();
+
+// The keyed hash for a standard container of UUIDs that a peer may choose: each hasher
+// draws its own seed, so that no peer can choose colliding keys.
+struct KeyedUuidHash {
+  std::uint64_t seed = randomTableSeed();
+  std::size_t operator()(const Uuid& id) const noexcept {
+    return static_cast<std::size_t>(flatTableHash(id, seed));
+  }
+};
 
 template <class T>
 std::uint64_t flatTableHash(const T* pointer, std::uint64_t seed) noexcept {
