@@ -1,5 +1,7 @@
 #include "qf/zero/core/saturated_bloom_filter.h"
 
+#include "qf/zero/core/internal/flat_table.h"
+
 #include <algorithm>
 #include <bit>
 #include <cstring>
@@ -13,18 +15,6 @@ namespace {
 constexpr std::uint64_t countersPerMember = 10;
 constexpr std::uint64_t minimumCounters = 64;
 constexpr std::uint64_t maximumExpectedCount = std::uint64_t{1} << 56;
-
-// Random uuids are already uniform, but version-1, name-based or hand-made test uuids are not
-// (fixed version bits, counters in a few bytes). A cheap finaliser spreads every input bit over
-// the whole word, so such uuids do not pile onto the same counters.
-std::uint64_t mix(std::uint64_t x) noexcept {
-  x ^= x >> 30;
-  x *= 0xbf58476d1ce4e5b9ULL;
-  x ^= x >> 27;
-  x *= 0x94d049bb133111ebULL;
-  x ^= x >> 31;
-  return x;
-}
 
 }  // namespace
 
@@ -44,7 +34,11 @@ SaturatedBloomFilter::Probe SaturatedBloomFilter::probeOf(const boost::uuids::uu
   static_assert(sizeof(id.data) == 2 * sizeof(std::uint64_t));
   std::memcpy(&high, id.data, sizeof high);
   std::memcpy(&low, id.data + sizeof high, sizeof low);
-  return Probe{mix(high ^ mix(low)), mix(low) | 1};
+  // Random uuids are already uniform, but version-1, name-based or hand-made test uuids are
+  // not (fixed version bits, counters in a few bytes): the finaliser spreads every input bit
+  // over the whole word, so such uuids do not pile onto the same counters.
+  using internal::mixBits;
+  return Probe{mixBits(high ^ mixBits(low)), mixBits(low) | 1};
 }
 
 std::size_t SaturatedBloomFilter::slot(const Probe& probe, unsigned i) const noexcept {
