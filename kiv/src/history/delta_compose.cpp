@@ -108,7 +108,7 @@ class DeltaSink {
 class StateSink {
  public:
   explicit StateSink(history::ComposedState& state) : state_(state) {}
-  ObjectStorage current(const Uuid& uuid) const { return state_.currentOf(uuid); }
+  const ObjectStorage& current(const Uuid& uuid) const { return state_.currentOf(uuid); }
   bool hasPrevious(const Uuid& uuid) const { return state_.previous.find(uuid) != nullptr; }
   void addCurrentUnlessPresent(const Uuid& uuid, const ObjectStorage& storage) {
     state_.current.tryInsert(uuid, storage);
@@ -185,20 +185,12 @@ std::pair<std::uint64_t, std::uint64_t> orderKey(const Uuid& uuid) noexcept {
 }  // namespace
 
 std::vector<std::pair<Uuid, const ObjectStorage*>> inUuidOrder(const StateEntries& entries) {
-  struct Keyed {
-    std::pair<std::uint64_t, std::uint64_t> key;
-    const Uuid* uuid;
-    const ObjectStorage* storage;
-  };
-  std::vector<Keyed> keyed;
-  keyed.reserve(entries.size());
-  entries.forEach([&](const Uuid& uuid, const ObjectStorage& storage) {
-    keyed.push_back({orderKey(uuid), &uuid, &storage});
-  });
-  std::sort(keyed.begin(), keyed.end(), [](const Keyed& a, const Keyed& b) { return a.key < b.key; });
   std::vector<std::pair<Uuid, const ObjectStorage*>> ordered;
-  ordered.reserve(keyed.size());
-  for (const Keyed& entry : keyed) ordered.emplace_back(*entry.uuid, entry.storage);
+  ordered.reserve(entries.size());
+  entries.forEach(
+      [&](const Uuid& uuid, const ObjectStorage& storage) { ordered.emplace_back(uuid, &storage); });
+  std::sort(ordered.begin(), ordered.end(),
+            [](const auto& a, const auto& b) { return orderKey(a.first) < orderKey(b.first); });
   return ordered;
 }
 
