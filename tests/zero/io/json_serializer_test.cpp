@@ -13,6 +13,7 @@
 
 #include <algorithm>
 #include <limits>
+#include <random>
 
 namespace qf::zero::io {
 namespace {
@@ -183,6 +184,30 @@ INSTANTIATE_TEST_SUITE_P(
       name.erase(std::remove(name.begin(), name.end(), '-'), name.end());
       return name;
     });
+
+// A large document is written into a text sized ahead from a sample of its entries. Whatever
+// the sizes of its entries (a first one listing all the others, names of random lengths), the
+// text is the document's dump and holds little unused room. (Documents of a few hundred
+// entries are not sized ahead.)
+class LargeDocument : public Serializer, public ::testing::WithParamInterface<unsigned> {};
+
+TEST_P(LargeDocument, IsItsDumpAndLeavesLittleRoom) {
+  std::mt19937 random(GetParam());
+  const std::size_t count = std::uniform_int_distribution<std::size_t>(600, 3000)(random);
+  ModelElement root = tm.node.instantiate(model);
+  for (std::size_t i = 0; i < count; ++i) {
+    ModelElement child = (random() % 4 == 0 ? tm.gadget : tm.node).instantiate(model);
+    tm.setName(child, std::u16string(std::uniform_int_distribution<std::size_t>(0, 400)(random), u'x'));
+    tm.refs(root, tm.children)->add(child);
+  }
+  JSONSerializer serializer;
+  std::string text;
+  serializer.serialize(model, SerializationOutput::forText(&text));
+  EXPECT_EQ(text, support::serializeModel(model).dump());
+  EXPECT_LT(text.capacity(), text.size() / 4 * 5) << count << " elements";
+}
+
+INSTANTIATE_TEST_SUITE_P(Seeds, LargeDocument, ::testing::Range(1u, 9u));
 
 // A metamodel whose values need registered serializers: a C++ enumeration, and an
 // opaque handle that must never reach a document.
