@@ -410,13 +410,26 @@ TEST_P(PacketExchange, ATransportMayBeDestroyedWhileThePeerKeepsSending) {
     return boost::optional<JSONPacket>();
   });
   connectClient();
+  // The flood keeps a window of unread notes, no more: unbounded, a sender whose I/O thread is
+  // starved would pass its own limit of unsent bytes and drop the connection before the server
+  // had read a hundred notes. Once the server is gone the window stays full until the close
+  // reaches the client.
+  constexpr int window = 1000;
+  const auto deadline = std::chrono::steady_clock::now() + patience;
   std::thread flood([&] {
+    int sent = 0;
     try {
-      for (;;) client->sendPacket(JSONPacket("Note", {{"payload", std::string(100, 'n')}}));
+      while (pair.a->isOpen() && std::chrono::steady_clock::now() < deadline + patience) {
+        if (sent - received >= window) {
+          std::this_thread::yield();
+          continue;
+        }
+        client->sendPacket(JSONPacket("Note", {{"payload", std::string(100, 'n')}}));
+        ++sent;
+      }
     } catch (const Raised<qf0::messages::ChannelClosed>&) {
     }
   });
-  const auto deadline = std::chrono::steady_clock::now() + patience;
   while (received < 100 && std::chrono::steady_clock::now() < deadline) std::this_thread::yield();
   EXPECT_GE(received, 100);
   server.reset();
