@@ -6,6 +6,7 @@
 #include <boost/uuid/name_generator_md5.hpp>
 #include <boost/uuid/uuid_io.hpp>
 
+#include <array>
 #include <random>
 
 namespace qf::zero {
@@ -53,26 +54,30 @@ std::u16string toText16(const Uuid& id) { return toUtf16(toText(id)); }
 std::optional<Uuid> parseUuid(std::string_view text) {
   std::string_view body = text;
   if (body.size() == 38 && body.front() == '{' && body.back() == '}') body = body.substr(1, 36);
-  if (body.size() != 36) return std::nullopt;
-  const auto nibble = [](char c) -> int {
-    if (c >= '0' && c <= '9') return c - '0';
-    if (c >= 'a' && c <= 'f') return c - 'a' + 10;
-    if (c >= 'A' && c <= 'F') return c - 'A' + 10;
-    return -1;
-  };
-  Uuid id;
-  std::size_t byte = 0;
-  for (std::size_t i = 0; i < body.size();) {
-    if (i == 8 || i == 13 || i == 18 || i == 23) {
-      if (body[i++] != '-') return std::nullopt;
-      continue;
-    }
-    const int high = nibble(body[i]);
-    const int low = nibble(body[i + 1]);
-    if (high < 0 || low < 0) return std::nullopt;
-    id.data[byte++] = static_cast<std::uint8_t>(high << 4 | low);
-    i += 2;
+  if (body.size() != 36 || body[8] != '-' || body[13] != '-' || body[18] != '-' || body[23] != '-') {
+    return std::nullopt;
   }
+  // Each character's value as a hex digit, or a value with bit 4 set for any other: the
+  // digits are decoded without a branch and checked once at the end.
+  static constexpr auto kNibbles = [] {
+    std::array<std::uint8_t, 256> nibbles{};
+    nibbles.fill(0x10);
+    for (int c = '0'; c <= '9'; ++c) nibbles[c] = static_cast<std::uint8_t>(c - '0');
+    for (int c = 'a'; c <= 'f'; ++c) nibbles[c] = static_cast<std::uint8_t>(c - 'a' + 10);
+    for (int c = 'A'; c <= 'F'; ++c) nibbles[c] = static_cast<std::uint8_t>(c - 'A' + 10);
+    return nibbles;
+  }();
+  static constexpr std::array<std::uint8_t, 16> kByteAt{0,  2,  4,  6,  9,  11, 14, 16,
+                                                        19, 21, 24, 26, 28, 30, 32, 34};
+  Uuid id;
+  unsigned invalid = 0;
+  for (std::size_t byte = 0; byte < 16; ++byte) {
+    const std::uint8_t high = kNibbles[static_cast<unsigned char>(body[kByteAt[byte]])];
+    const std::uint8_t low = kNibbles[static_cast<unsigned char>(body[kByteAt[byte] + 1])];
+    invalid |= high | low;
+    id.data[byte] = static_cast<std::uint8_t>(high << 4 | (low & 0x0f));
+  }
+  if ((invalid & 0x10) != 0) return std::nullopt;
   return id;
 }
 
