@@ -1,5 +1,6 @@
-// JsonText holds a JSON value as its compact text: on seeded random values, parsing the
-// text gives the value back exactly, and two texts are equal exactly when their values are.
+// JsonText holds a JSON value as its compact text: on seeded random values, the text is the
+// value's dump, parsing it gives the value back exactly, and two texts are equal exactly when
+// their values are.
 #include "qf/zero/core/json_text.h"
 
 #include "qf/zero/core/messages.h"
@@ -9,6 +10,8 @@
 
 #include <nlohmann/json.hpp>
 
+#include <cstdint>
+#include <limits>
 #include <random>
 #include <string>
 
@@ -24,13 +27,21 @@ ordered_json randomValue(std::mt19937& random, int depth) {
       return nullptr;
     case 1:
       return pick(2) == 0;
-    case 2:
-      return pick(2000) - 1000;
-    case 3:
-      return (pick(2000) - 1000) / 7.0;
+    case 2: {
+      static const ordered_json integers[] = {0, -1, std::numeric_limits<std::int64_t>::min(),
+                                              std::numeric_limits<std::int64_t>::max(),
+                                              std::numeric_limits<std::uint64_t>::max()};
+      return pick(2) == 0 ? ordered_json(pick(2000) - 1000) : integers[pick(5)];
+    }
+    case 3: {
+      static const double floats[] = {0.1, -2.5, 1e300, 5e-324, 1e-7};
+      return pick(2) == 0 ? (pick(2000) - 1000) / 7.0 : floats[pick(5)];
+    }
     case 4: {
-      static const char* const texts[] = {"", "a", "Grüße", "line\nbreak", "quote \" and \\", "日本"};
-      return texts[pick(6)];
+      static const char* const texts[] = {
+          "",         "a",        "Grüße",        "line\nbreak", "quote \" and \\", "日本",
+          "\x01\x1f", "del \x7f", "\u2028\u2029", "tab\there",   "/slash/",         "\U0001F600"};
+      return texts[pick(12)];
     }
     case 5: {
       ordered_json array = ordered_json::array();
@@ -53,6 +64,7 @@ TEST_P(JsonTextRoundTrip, ParsingTheTextGivesTheValueAndTextsCompareAsValues) {
   for (int i = 0; i < 50; ++i) {
     const ordered_json a = randomValue(random, 0);
     const ordered_json b = randomValue(random, 0);
+    EXPECT_EQ(JsonText(a).text(), a.dump()) << a.dump();
     EXPECT_EQ(JsonText(a).parse(), a) << a.dump();
     EXPECT_EQ(JsonText(a) == JsonText(b), a == b) << a.dump() << " against " << b.dump();
   }
@@ -60,10 +72,14 @@ TEST_P(JsonTextRoundTrip, ParsingTheTextGivesTheValueAndTextsCompareAsValues) {
 
 INSTANTIATE_TEST_SUITE_P(Seeds, JsonTextRoundTrip, ::testing::Range(1u, 21u));
 
-TEST(JsonText, HoldsNullByDefaultAndRefusesAStringThatIsNotUtf8) {
+TEST(JsonText, HoldsNullByDefaultAndRefusesAStringOrKeyThatIsNotUtf8) {
   EXPECT_EQ(JsonText().parse(), ordered_json(nullptr));
   EXPECT_EQ(JsonText(), JsonText(ordered_json(nullptr)));
   EXPECT_THROW(JsonText(ordered_json{{"name", std::string("\xff\xfe")}}),
+               foundation::core::except::Exception<qf0::messages::InvalidValue>);
+  EXPECT_THROW(JsonText(ordered_json{{std::string("key \xc3"), 1}}),
+               foundation::core::except::Exception<qf0::messages::InvalidValue>);
+  EXPECT_THROW(JsonText(ordered_json::array({"plain", std::string("\xed\xa0\x80")})),
                foundation::core::except::Exception<qf0::messages::InvalidValue>);
 }
 

@@ -6,14 +6,97 @@
 
 #include <nlohmann/json.hpp>
 
+#include <charconv>
+#include <iterator>
+#include <string>
 #include <utility>
 
 namespace qf::zero {
 
 namespace {
 
+using Json = nlohmann::ordered_json;
+
 // Spare room a taken text may keep rather than be copied into a buffer of its size.
 constexpr std::size_t kKeptSlack = 16;
+
+// True for a string that the compact dump writes as it stands between quotes: printable
+// ASCII without a quote or a backslash, which is what most strings of a model are.
+bool isPlainAscii(const std::string& text) noexcept {
+  for (const char c : text) {
+    const auto byte = static_cast<unsigned char>(c);
+    if (byte < 0x20 || byte >= 0x7f || c == '"' || c == '\\') return false;
+  }
+  return true;
+}
+
+void appendString(std::string& out, const std::string& text) {
+  if (isPlainAscii(text)) {
+    out += '"';
+    out += text;
+    out += '"';
+    return;
+  }
+  // Escapes, and a text that is not UTF-8, are left to nlohmann's own writer.
+  out += Json(text).dump(-1, ' ', false);
+}
+
+template <class Integer>
+void appendInteger(std::string& out, Integer value) {
+  char digits[24];
+  const auto end = std::to_chars(std::begin(digits), std::end(digits), value).ptr;
+  out.append(digits, end);
+}
+
+// value.dump(-1, ' ', false), byte for byte, without nlohmann's character-by-character
+// writer for the strings and integers that need no care; floats and the rare kinds are
+// written by nlohmann itself.
+void appendCompact(std::string& out, const Json& value) {
+  switch (value.type()) {
+    case Json::value_t::object: {
+      out += '{';
+      bool first = true;
+      for (const auto& [key, member] : value.get_ref<const Json::object_t&>()) {
+        if (!first) out += ',';
+        first = false;
+        appendString(out, key);
+        out += ':';
+        appendCompact(out, member);
+      }
+      out += '}';
+      return;
+    }
+    case Json::value_t::array: {
+      out += '[';
+      bool first = true;
+      for (const Json& item : value.get_ref<const Json::array_t&>()) {
+        if (!first) out += ',';
+        first = false;
+        appendCompact(out, item);
+      }
+      out += ']';
+      return;
+    }
+    case Json::value_t::string:
+      appendString(out, value.get_ref<const std::string&>());
+      return;
+    case Json::value_t::boolean:
+      out += value.get<bool>() ? "true" : "false";
+      return;
+    case Json::value_t::number_integer:
+      appendInteger(out, value.get<Json::number_integer_t>());
+      return;
+    case Json::value_t::number_unsigned:
+      appendInteger(out, value.get<Json::number_unsigned_t>());
+      return;
+    case Json::value_t::null:
+      out += "null";
+      return;
+    default:
+      out += value.dump(-1, ' ', false);
+      return;
+  }
+}
 
 }  // namespace
 
@@ -21,12 +104,12 @@ JsonText::JsonText() : text_("null") {}
 
 JsonText::JsonText(const nlohmann::ordered_json& value) {
   try {
-    text_ = value.dump(-1, ' ', false);
+    appendCompact(text_, value);
   } catch (const nlohmann::json::exception&) {
     reportException(qf0::messages::InvalidValue());
   }
-  // A dump grows its buffer by doubling: a held text keeps only what it needs.
-  text_.shrink_to_fit();
+  // The text grew by doubling: a held text keeps only what it needs.
+  if (text_.capacity() > text_.size() + kKeptSlack) text_.shrink_to_fit();
 }
 
 JsonText JsonText::fromCompactText(std::string text) noexcept {
