@@ -48,6 +48,19 @@ def _no_such_property(cls, call):
             f"                                                property ? property.getName() : std::u16string()));")
 
 
+def _set_from_value(p):
+    """The statements of basicSetValue for one property. A value held as text is written from
+    the JSON value the Value holds, without copying that value out first."""
+    if p.held_as_text:
+        json_type = value_type(p.type)
+        return [f"if (const auto* held = value.peek<{json_type}>()) {{",
+                f"  basicSet{p.cap}(*held);",
+                "  return;",
+                "}",
+                f"basicSet{p.cap}(value.getValue<{json_type}>());", "return;"]
+    return [f"basicSet{p.cap}(value.getValue<{member_type(p)}>());", "return;"]
+
+
 def reflection_source(d, cls):
     ns = cls.package.namespace
     n = cls.name
@@ -64,7 +77,7 @@ def reflection_source(d, cls):
     lines += _dispatch(d, cls, single, lambda p: [f"return {_wrap(p, member(p))};"],
                        _no_such_property(cls, "basicGetValue(property)"))
     lines += ["}", "", f"void {n}::Impl::basicSetValue(const {QZ}::meta::Property& property, const {QZ}::Value& value) {{"]
-    lines += _dispatch(d, cls, single, lambda p: [f"basicSet{p.cap}(value.getValue<{value_type(p.type) if p.held_as_text else member_type(p)}>());", "return;"],
+    lines += _dispatch(d, cls, single, _set_from_value,
                        ("  (void)value;\n" if cls.superclass is None else "")
                        + _no_such_property(cls, "basicSetValue(property, value)").replace("  return ", "  "))
     held = [p for p in single if p.held_as_text]
