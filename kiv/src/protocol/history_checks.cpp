@@ -91,11 +91,12 @@ void checkStoredEntry(const qf::zero::JsonValue& storageEntry) {
   const MetaPackageKiv& kiv = MetaPackageKiv::getInstance();
   static const std::string elementUuidName = qf::zero::toUtf8(kiv.getObjectStorage_elementUUID().getName());
   static const std::string contentName = qf::zero::toUtf8(kiv.getObjectStorage_content().getName());
+  static const std::string nilUuidText = qf::zero::toText(qf::zero::Uuid());
   const auto elementUuid = properties->find(elementUuidName);
   const auto stored = properties->find(contentName);
   const bool namesElement = elementUuid != properties->end() && elementUuid->is_string() &&
                             !elementUuid->get_ref<const std::string&>().empty() &&
-                            elementUuid->get_ref<const std::string&>() != qf::zero::toText(qf::zero::Uuid());
+                            elementUuid->get_ref<const std::string&>() != nilUuidText;
   const auto refuse = [&](const std::string& what) {
     qf::zero::reportException(messages::MalformedHistory("storage " + id->get<std::string>() + " " + what));
   };
@@ -140,7 +141,9 @@ void checkStorageEntries(const qf::zero::JsonValue& document) {
   for (const qf::zero::JsonValue& entry : *entries) {
     if (!entry.is_object()) continue;
     const auto type = entry.find(JSONConstants::TYPE_ATTR);
-    if (type != entry.end() && *type == storageClass) checkStoredEntry(entry);
+    if (type != entry.end() && type->is_string() && type->get_ref<const std::string&>() == storageClass) {
+      checkStoredEntry(entry);
+    }
   }
 }
 
