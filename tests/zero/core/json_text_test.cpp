@@ -41,7 +41,13 @@ ordered_json randomValue(std::mt19937& random, int depth) {
       static const char* const texts[] = {
           "",         "a",        "Grüße",        "line\nbreak", "quote \" and \\", "日本",
           "\x01\x1f", "del \x7f", "\u2028\u2029", "tab\there",   "/slash/",         "\U0001F600"};
-      return texts[pick(12)];
+      if (pick(2) == 0) return texts[pick(12)];
+      // Longer strings of the bytes at the edges of what is written as it stands, so that
+      // every position of an eight-byte word meets each of them.
+      static const char* const pieces[] = {"\x1f", " ", "!", "\"", "\\", "[", "]", "~", "\x7f", "a", "é"};
+      std::string text;
+      for (int i = pick(40); i > 0; --i) text += pick(4) == 0 ? pieces[pick(11)] : "a";
+      return text;
     }
     case 5: {
       ordered_json array = ordered_json::array();

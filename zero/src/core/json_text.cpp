@@ -7,6 +7,8 @@
 #include <nlohmann/json.hpp>
 
 #include <charconv>
+#include <cstdint>
+#include <cstring>
 #include <iterator>
 #include <string>
 #include <utility>
@@ -23,9 +25,28 @@ constexpr std::size_t kKeptSlack = 16;
 // True for a string that the compact dump writes as it stands between quotes: printable
 // ASCII without a quote or a backslash, which is what most strings of a model are.
 bool isPlainAscii(const std::string& text) noexcept {
-  for (const char c : text) {
-    const auto byte = static_cast<unsigned char>(c);
-    if (byte < 0x20 || byte >= 0x7f || c == '"' || c == '\\') return false;
+  // Eight bytes at a time: a byte below 0x20, at or above 0x7f, or equal to '"' or '\\' sets
+  // a high bit in `special`. The range tests work on the low seven bits of every byte, where
+  // no borrow or carry crosses into the next byte, and a byte at or above 0x80 sets its high
+  // bit itself; the tests for a quote and a backslash are the zero-byte test, exact in whether
+  // any byte matches.
+  constexpr std::uint64_t kOnes = 0x0101010101010101ULL;
+  constexpr std::uint64_t kHighs = 0x8080808080808080ULL;
+  const auto hasZeroByte = [](std::uint64_t word) { return (word - kOnes) & ~word & kHighs; };
+  std::size_t at = 0;
+  for (; at + 8 <= text.size(); at += 8) {
+    std::uint64_t word;
+    std::memcpy(&word, text.data() + at, 8);
+    const std::uint64_t low7 = word & ~kHighs;
+    const std::uint64_t belowSpace = ~((low7 | kHighs) - 0x20 * kOnes);
+    const std::uint64_t isDelete = low7 + kOnes;
+    const std::uint64_t special = word | belowSpace | isDelete | hasZeroByte(word ^ (0x22 * kOnes)) |
+                                  hasZeroByte(word ^ (0x5c * kOnes));
+    if ((special & kHighs) != 0) return false;
+  }
+  for (; at < text.size(); ++at) {
+    const auto byte = static_cast<unsigned char>(text[at]);
+    if (byte < 0x20 || byte >= 0x7f || byte == '"' || byte == '\\') return false;
   }
   return true;
 }
