@@ -136,9 +136,13 @@ std::string toUtf8(std::u16string_view text) {
 }
 
 std::u16string toUtf16(std::string_view text) {
-  std::u16string out;
-  out.reserve(text.size());
+  // A text has at most as many UTF-16 units as bytes. Its ASCII start, which for most texts
+  // is all of it, is widened as it stands.
+  std::u16string out(text.size(), u'\0');
   std::size_t pos = 0;
+  for (; pos < text.size() && static_cast<unsigned char>(text[pos]) < 0x80; ++pos) out[pos] = text[pos];
+  if (pos == text.size()) return out;
+  out.resize(pos);
   while (pos < text.size()) appendUtf16(out, decodeUtf8(text, pos));
   return out;
 }
