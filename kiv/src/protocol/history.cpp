@@ -43,7 +43,12 @@ qf::zero::Transaction beginOn(const ModelElement::Impl& element) {
 class HistoryParseCustomizer : public qf::zero::io::ParseCustomizer {
  public:
   HistoryParseCustomizer(qf::zero::Model model, const std::vector<std::u16string>& properties)
-      : model_(std::move(model)), properties_(properties.begin(), properties.end()) {}
+      : model_(std::move(model)) {
+    for (const qf::zero::meta::Property& property : History::metaClass()->getAllProperties()) {
+      if (std::find(properties.begin(), properties.end(), property.getName()) != properties.end())
+        properties_.push_back(property);
+    }
+  }
 
   bool shallInstantiate(const qf::zero::meta::Class& type, const qf::zero::io::ElementId& id) override {
     const MetaPackageKiv& kiv = MetaPackageKiv::getInstance();
@@ -82,11 +87,11 @@ class HistoryParseCustomizer : public qf::zero::io::ParseCustomizer {
 
  private:
   bool reads(const qf::zero::meta::Property& property) const {
-    return properties_.count(std::u16string(property.getName())) != 0;
+    return std::find(properties_.begin(), properties_.end(), property) != properties_.end();
   }
 
   qf::zero::Model model_;
-  std::unordered_set<std::u16string> properties_;
+  std::vector<qf::zero::meta::Property> properties_;  // the History's properties read
   int histories_ = 0;
 };
 

@@ -1,12 +1,16 @@
 // Object storages: the stored state of one user element, how two of them compare, and
 // how a stored state is turned back into a live element.
 #include "history_fixture.h"
+#include "qf/zero/core/json_text.h"
 #include "qf/zero/io/json_serializer.h"
 
 #include <boost/date_time/gregorian/gregorian.hpp>
 #include <boost/optional.hpp>
 #include <boost/optional/optional_io.hpp>
 #include <boost/uuid/uuid_io.hpp>
+
+#include <random>
+#include <set>
 
 namespace {
 
@@ -215,5 +219,91 @@ TEST_F(ObjectStorageEqualityWithoutElement, NeedsBothElementUuidsAbsent) {
   const Model third = Model::create();
   EXPECT_FALSE(mine.isEqual(twin(mine, third, qf::zero::generateNewUuid(), kContent)));
 }
+
+// Storages read from a document hold the compact text of the document's own content; a
+// refresh in place is recorded like any change, and a cancelled parse leaves no trace.
+class ParsedStorages : public HistoryTest, public ::testing::WithParamInterface<unsigned> {
+ protected:
+  struct ModifiedElements : qf::zero::Listener {
+    void transactionCommitted(const std::shared_ptr<qf::zero::ShallowChangeReport<ModelElement>>& report) {
+      modified = report->getModified();
+    }
+    std::vector<ModelElement> modified;
+  };
+
+  // A document of storages with the ids `ids`, each of the element its id names by
+  // name, with the contents `contents`.
+  static JsonValue documentOf(const std::vector<Uuid>& ids, const std::vector<JsonValue>& contents) {
+    const Model source = Model::create();
+    for (std::size_t i = 0; i < ids.size(); ++i) {
+      kiv::ObjectStorage::Builder(source)
+          .doSetElementUUID(qf::zero::nameBasedUuid(ids[i], "element"))
+          .doSetContent(contents[i])
+          .create(ids[i]);
+    }
+    return support::serializeModel(source);
+  }
+
+  static void parse(const JsonValue& document, const Model& model, bool reusing, bool commit) {
+    std::unique_ptr<qf::zero::io::ModelBuilder> builder;
+    if (reusing) {
+      builder = std::make_unique<qf::zero::io::ElementReusingModelBuilder>();
+    } else {
+      builder = std::make_unique<qf::zero::io::ModelBuilder>();
+    }
+    qf::zero::io::JSONParser parser(std::make_unique<qf::zero::io::ParseCustomizer>(), std::move(builder));
+    qf::zero::Transaction transaction = model->beginTransaction();
+    parser.parseVerbatim(document, model);
+    if (commit) transaction.commit();
+  }
+
+  static std::string heldTextOf(const ModelElement& storage) {
+    const ModelElement::Impl& impl = *storage.getImpl();
+    return impl.basicGetHeldText(kiv::MetaPackageKiv::getInstance().getObjectStorage_content())->text();
+  }
+};
+
+TEST_P(ParsedStorages, HoldTheDocumentsContentAsItsCompactText) {
+  std::mt19937 random(GetParam());
+  std::vector<Uuid> ids;
+  std::vector<JsonValue> firsts, seconds;
+  for (int i = 0; i < 30; ++i) {
+    ids.push_back(qf::zero::generateNewUuid());
+    firsts.push_back(support::randomJsonValue(random));
+    // Every third storage is given its content again, which a refresh leaves alone.
+    seconds.push_back(i % 3 == 0 ? firsts.back() : support::randomJsonValue(random));
+  }
+  const auto expectContents = [&](const std::vector<JsonValue>& contents, const char* when) {
+    for (std::size_t i = 0; i < ids.size(); ++i) {
+      const ModelElement storage = repository->findElement(ids[i]);
+      ASSERT_TRUE(storage) << when;
+      EXPECT_EQ(heldTextOf(storage), qf::zero::JsonText(contents[i]).text()) << when << ", storage " << i;
+      EXPECT_EQ(qf::zero::elementCast<kiv::ObjectStorage>(storage).getContent(), contents[i]) << when;
+    }
+  };
+
+  parse(documentOf(ids, firsts), repository, /*reusing=*/false, /*commit=*/false);
+  EXPECT_EQ(repository->getElementCount(), 0U) << "a cancelled parse leaves nothing";
+  parse(documentOf(ids, firsts), repository, false, true);
+  expectContents(firsts, "parsed");
+
+  const JsonValue refresh = documentOf(ids, seconds);
+  parse(refresh, repository, /*reusing=*/true, /*commit=*/false);
+  expectContents(firsts, "refresh cancelled");
+
+  ModifiedElements observer;
+  repository->addShallowListener(&observer);
+  parse(refresh, repository, true, true);
+  repository->removeListener(&observer);
+  expectContents(seconds, "refreshed");
+  std::set<Uuid> expected, modified;
+  for (std::size_t i = 0; i < ids.size(); ++i) {
+    if (qf::zero::JsonText(firsts[i]) != qf::zero::JsonText(seconds[i])) expected.insert(ids[i]);
+  }
+  for (const ModelElement& element : observer.modified) modified.insert(element.getUuid());
+  EXPECT_EQ(modified, expected) << "exactly the storages whose content changed are modified";
+}
+
+INSTANTIATE_TEST_SUITE_P(Seeds, ParsedStorages, ::testing::Range(1U, 9U));
 
 }  // namespace

@@ -2,6 +2,7 @@
 #include "qf/zero/core/builder.h"
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/meta/framework_package.h"
+#include "qf/zero/core/meta/meta_registry.h"
 #include "support/test_metamodel.h"
 
 #include <gtest/gtest.h>
@@ -53,6 +54,36 @@ TEST_F(Reflection, RegistryKnowsTheFrameworkTypesAndRegisteredPackages) {
   meta::Class clash = meta::Class::create(other, {}, u"Node", u"tm.Node", false);
   EXPECT_THROW(registry.registerType(clash), Exception<msg::TypeAlreadyRegistered>);
   EXPECT_EQ(tm.count.getQualifiedName(), u"tm.Node.count");
+}
+
+// A class is built by the factory registered for that very class: a class registered later
+// under the same name does not inherit it, and unregistering drops it.
+TEST_F(Reflection, AClassIsBuiltByTheFactoryRegisteredForItOnly) {
+  auto& registry = meta::MetaRegistry::getInstance();
+  const Model metamodel = Model::create();
+  int built = 0;
+  const auto countingFactory = [&built](const meta::Class& type) {
+    return [&built, type](const Model& target) {
+      ++built;
+      return std::make_unique<DynamicElementBuilder>(type, target);
+    };
+  };
+  const meta::Class first = meta::Class::create(metamodel, {}, u"Lamp", u"registry.Lamp", false);
+  registry.registerType(first, {}, countingFactory(first));
+  EXPECT_EQ(first.instantiate(model).getMetaClass(), first);
+  EXPECT_EQ(built, 1);
+  registry.unregisterType(first);
+  EXPECT_EQ(first.instantiate(model).getMetaClass(), first);
+  EXPECT_EQ(built, 1) << "an unregistered class is built as a dynamic element";
+
+  const meta::Class second = meta::Class::create(metamodel, {}, u"Lamp", u"registry.Lamp", false);
+  registry.registerType(second);
+  EXPECT_EQ(second.instantiate(model).getMetaClass(), second);
+  EXPECT_EQ(built, 1) << "the factory was the first class's, not its name's";
+  registry.registerType(second, {}, countingFactory(second));
+  second.instantiate(model);
+  EXPECT_EQ(built, 2) << "a factory given to a registered class is used from then on";
+  registry.unregisterType(second);
 }
 
 TEST_F(Reflection, InvokeCallsTheInvokerWithCheckedArguments) {

@@ -216,7 +216,8 @@ def _impl_class(d, cls):
               f"  {QZ}::Value basicGetValue(const {QZ}::meta::Property& property) const override;",
               f"  void basicSetValue(const {QZ}::meta::Property& property, const {QZ}::Value& value) override;",
               f"  {QZ}::AbstractOwnedCollection* basicGetCollection(const {QZ}::meta::Property& property) const override;",
-              *([f"  const {QZ}::JsonText* basicGetHeldText(const {QZ}::meta::Property& property) const override;"]
+              *([f"  const {QZ}::JsonText* basicGetHeldText(const {QZ}::meta::Property& property) const override;",
+                 f"  bool assignHeldText(const {QZ}::meta::Property& property, {QZ}::JsonText text, bool initializing) override;"]
                 if any(p.held_as_text for p in raw) else []),
               *([f"  {QZ}::MapKey basicGetMapKey(const {QZ}::meta::Property& property) const override;"]
                 if map_key_properties(cls) else []),
@@ -228,6 +229,9 @@ def _impl_class(d, cls):
         lines += [f"  void basicSet{p.cap}({param(p)} value);" for p in raw]
     if cls.properties:
         lines += ["", " private:"]
+        for p in raw:
+            if p.held_as_text:
+                lines.append(f"  void assign{p.cap}Text({QZ}::JsonText text, bool initializing);")
         for p in cls.properties:
             init = default_initializer(p)
             if p.many:
@@ -395,10 +399,11 @@ def _accessors(d, cls, p):
     if p.held_as_text:
         text_value = f"{QZ}::Value::createPrimitiveValue(property, text.parse())"
         lines += ["", f"void {n}::Impl::set{p.cap}({param(p)} value) {{ set{p.cap}Text({QZ}::JsonText(value)); }}", "",
-                  f"void {n}::Impl::set{p.cap}Text({QZ}::JsonText text) {{", "  checkNotProxy();",
+                  f"void {n}::Impl::set{p.cap}Text({QZ}::JsonText text) {{ assign{p.cap}Text(std::move(text), false); }}",
+                  "", f"void {n}::Impl::assign{p.cap}Text({QZ}::JsonText text, bool initializing) {{", "  checkNotProxy();",
                   f"  if ({m} == text) return;", f"  const auto& property = {getter};",
-                  "  if (!canStoreDirectly(property)) {", f"    assignValue(property, {text_value}, false);",
-                  "    return;", "  }", f"  {QZ}::Transaction transaction = beginDirectStore(property);",
+                  "  if (!canStoreDirectly(property, initializing)) {",
+                  f"    assignValue(property, {text_value}, initializing);", "    return;", "  }", f"  {QZ}::Transaction transaction = beginDirectStore(property);",
                   f"  {m} = std::move(text);", "  transaction.commit();", "}", "",
                   f"void {n}::Impl::basicSet{p.cap}({param(p)} value) {{", f"  {m} = {QZ}::JsonText(value);", "}", ""]
         return lines

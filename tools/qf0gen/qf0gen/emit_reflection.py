@@ -85,6 +85,10 @@ def reflection_source(d, cls):
         lines += ["}", "", f"const {QZ}::JsonText* {n}::Impl::basicGetHeldText(const {QZ}::meta::Property& property) const {{"]
         lines += _dispatch(d, cls, held, lambda p: [f"return &{member(p)};"],
                            f"  return {base}::basicGetHeldText(property);")
+        lines += ["}", "", f"bool {n}::Impl::assignHeldText(const {QZ}::meta::Property& property, {QZ}::JsonText text, "
+                  "bool initializing) {"]
+        lines += _dispatch(d, cls, held, lambda p: [f"assign{p.cap}Text(std::move(text), initializing);", "return true;"],
+                           f"  return {base}::assignHeldText(property, std::move(text), initializing);")
     keyed = map_key_properties(cls)
     if keyed:
         lines += ["}", "", f"{QZ}::MapKey {n}::Impl::basicGetMapKey(const {QZ}::meta::Property& property) const {{"]

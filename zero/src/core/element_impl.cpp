@@ -3,6 +3,7 @@
 #include "core/transaction_state.h"
 #include "qf/zero/core/builder.h"
 #include "qf/zero/core/internal/storage.h"
+#include "qf/zero/core/json_text.h"
 #include "qf/zero/core/messages.h"
 #include "qf/zero/core/meta/enum.h"
 #include "qf/zero/core/meta/operation.h"
@@ -626,6 +627,8 @@ Value ModelElement::invoke(const meta::Operation& operation, std::vector<Value> 
 void ModelElement::destroy() { impl_->destroy(); }
 
 const JsonText* ModelElement::Impl::basicGetHeldText(const meta::Property&) const { return nullptr; }
+
+bool ModelElement::Impl::assignHeldText(const meta::Property&, JsonText, bool) { return false; }
 
 MapKey ModelElement::Impl::basicGetMapKey(const meta::Property& property) const {
   return mapKeyFromValue(basicGetValue(property));

@@ -11,6 +11,7 @@
 #include <cstring>
 #include <iterator>
 #include <string>
+#include <type_traits>
 #include <utility>
 
 namespace qf::zero {
@@ -119,17 +120,72 @@ void appendCompact(std::string& out, const Json& value) {
   }
 }
 
+template <class Integer>
+std::size_t decimalLength(Integer value) {
+  std::size_t length = 1;
+  if constexpr (std::is_signed_v<Integer>) {
+    if (value < 0) {
+      ++length;
+      // The quotient keeps the sign; its magnitude is what is counted.
+      while (value <= -10) {
+        value /= 10;
+        ++length;
+      }
+      return length;
+    }
+  }
+  while (value >= 10) {
+    value /= 10;
+    ++length;
+  }
+  return length;
+}
+
+// The length of the compact text of `value` when none of its strings needs escaping and
+// every float takes the longest form it may: the room to reserve, so that the text is
+// written without growing and kept without a copy.
+std::size_t compactLength(const Json& value) {
+  switch (value.type()) {
+    case Json::value_t::object: {
+      const auto& members = value.get_ref<const Json::object_t&>();
+      std::size_t length = members.empty() ? 2 : members.size() + 1;
+      for (const auto& [key, member] : members) length += key.size() + 3 + compactLength(member);
+      return length;
+    }
+    case Json::value_t::array: {
+      const auto& items = value.get_ref<const Json::array_t&>();
+      std::size_t length = items.empty() ? 2 : items.size() + 1;
+      for (const Json& item : items) length += compactLength(item);
+      return length;
+    }
+    case Json::value_t::string:
+      return value.get_ref<const std::string&>().size() + 2;
+    case Json::value_t::boolean:
+      return value.get<bool>() ? 4 : 5;
+    case Json::value_t::number_integer:
+      return decimalLength(value.get<Json::number_integer_t>());
+    case Json::value_t::number_unsigned:
+      return decimalLength(value.get<Json::number_unsigned_t>());
+    case Json::value_t::number_float:
+      return 24;
+    default:
+      return 4;
+  }
+}
+
 }  // namespace
 
 JsonText::JsonText() : text_("null") {}
 
 JsonText::JsonText(const nlohmann::ordered_json& value) {
   try {
+    text_.reserve(compactLength(value));
     appendCompact(text_, value);
   } catch (const nlohmann::json::exception&) {
     reportException(qf0::messages::InvalidValue());
   }
-  // The text grew by doubling: a held text keeps only what it needs.
+  // A text that needed escapes grew by doubling, and one with floats may not fill its
+  // room: a held text keeps only what it needs.
   if (text_.capacity() > text_.size() + kKeptSlack) text_.shrink_to_fit();
 }
 

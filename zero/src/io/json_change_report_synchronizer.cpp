@@ -33,6 +33,9 @@ class ReusingBuilder final : public ModelBuilder {
   void setValue(ModelElement& element, const meta::Property& property, const Value& value) override {
     inner_->setValue(element, property, value);
   }
+  void setJsonValue(ModelElement& element, const meta::Property& property, const JsonValue& json) override {
+    inner_->setJsonValue(element, property, json);
+  }
   void setObjectValue(ModelElement& element, const meta::Property& property, const Value& item) override {
     inner_->setObjectValue(element, property, item);
   }

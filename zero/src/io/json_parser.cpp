@@ -1,6 +1,7 @@
 #include "qf/zero/io/json_parser.h"
 
 #include "attribute_codec.h"
+#include "qf/zero/core/internal/flat_table.h"
 #include "qf/zero/core/meta/enum.h"
 #include "qf/zero/core/meta/framework_package.h"
 #include "qf/zero/core/model_impl.h"
@@ -71,7 +72,8 @@ class JSONParser::Run {
     ElementId id;
     if (const auto idJson = json.find(JSONConstants::ID_ATTR); idJson != json.end() && !idJson->is_null()) {
       id.uuid = readUuid(*idJson, [&] { return entryLabel(index); });
-      if (byUuid_.count(*id.uuid) != 0) reportException(msg::DuplicateElementId(toText(*id.uuid)));
+      if (byUuid_.find(*id.uuid) != nullptr || skipped_.count(*id.uuid) != 0)
+        reportException(msg::DuplicateElementId(toText(*id.uuid)));
     }
     const ordered_json* content = nullptr;
     if (const auto c = json.find(JSONConstants::CONTENT_ATTR); c != json.end() && !c->is_null()) {
@@ -79,12 +81,12 @@ class JSONParser::Run {
       content = &*c;
     }
     if (!customizer_.shallInstantiate(metaClass, id)) {
-      if (id.uuid) byUuid_.emplace(*id.uuid, ModelElement());
+      if (id.uuid) skipped_.insert(*id.uuid);
       return;
     }
     ModelElement element = builder_.instantiate(model_, metaClass, id);
     if (!element) return;
-    byUuid_.insert_or_assign(element.getUuid(), element);
+    byUuid_.insertOrAssign(element.getUuid(), element);
     entries_.push_back(Entry{index, std::move(element), metaClass, content});
   }
 
@@ -130,6 +132,8 @@ class JSONParser::Run {
           builder_.setObjectValue(entry.element, plan.property,
                                   readAttribute(plan.property, plan.codec, item));
         }
+      } else if (plan.codec.kind == internal::AttributeKind::Json && !json.is_null()) {
+        builder_.setJsonValue(entry.element, plan.property, json);
       } else {
         builder_.setValue(entry.element, plan.property, readAttribute(plan.property, plan.codec, json));
       }
@@ -252,7 +256,7 @@ class JSONParser::Run {
   ModelElement resolve(const meta::Property& property, const ordered_json& json) {
     if (!json.is_string()) wrongType(property, "a UUID string", json);
     const Uuid uuid = readUuid(json, [&] { return toUtf8(property.getQualifiedName()); });
-    if (auto it = byUuid_.find(uuid); it != byUuid_.end() && it->second) return it->second;
+    if (const ModelElement* element = byUuid_.find(uuid)) return *element;
     const auto targetClass = elementCast<meta::Class>(ModelElement(property->getType()));
     ModelElement found = customizer_.findReference(builder_, model_, targetClass, ElementId{uuid});
     if (!found) reportException(msg::DanglingReference(property.getQualifiedName(), toText(uuid)));
@@ -273,7 +277,9 @@ class JSONParser::Run {
   std::unordered_map<std::string, meta::Class> classes_;
   Model model_;
   std::vector<Entry> entries_;
-  std::unordered_map<Uuid, ModelElement, qf::zero::internal::KeyedUuidHash> byUuid_;
+  // The document's elements, and the UUIDs of entries the customizer skipped.
+  qf::zero::internal::FlatTable<Uuid, ModelElement> byUuid_{qf::zero::internal::randomTableSeed()};
+  std::unordered_set<Uuid, qf::zero::internal::KeyedUuidHash> skipped_;
   std::unordered_map<const void*, std::unordered_map<std::string, PropertyPlan>> plans_;
   std::unordered_set<const void*> placed_;
 };

@@ -1,6 +1,7 @@
 #include "qf/zero/io/model_builder.h"
 
 #include "qf/zero/core/builder.h"
+#include "qf/zero/core/json_text.h"
 #include "qf/zero/core/meta/property_serializer.h"
 #include "qf/zero/core/model_impl.h"
 #include "qf/zero/core/owned_collection.h"
@@ -24,6 +25,15 @@ ModelElement ModelBuilder::findReference(const Model& model, const meta::Class&,
 
 void ModelBuilder::setValue(ModelElement& element, const meta::Property& property, const Value& value) {
   element->assignValue(property, value, true);
+}
+
+void ModelBuilder::setJsonValue(ModelElement& element, const meta::Property& property,
+                                const JsonValue& json) {
+  if (element->basicGetHeldText(property) != nullptr &&
+      element->assignHeldText(property, JsonText(json), /*initializing=*/true)) {
+    return;
+  }
+  setValue(element, property, Value::createPrimitiveValue(property, json));
 }
 
 void ModelBuilder::setObjectValue(ModelElement& element, const meta::Property& property, const Value& item) {

@@ -7,6 +7,13 @@
 
 namespace qf::zero::meta {
 
+namespace {
+
+// One key for a type whichever handle class names it.
+const void* identityOf(const ModelElement& type) { return type.getImpl(); }
+
+}  // namespace
+
 Type MetaRegistry::getType(std::u16string_view qualifiedName) const {
   std::shared_lock lock(mutex_);
   auto it = types_.find(qualifiedName);
@@ -36,18 +43,22 @@ void MetaRegistry::registerType(const Type& type, CollectionFactory collections,
   it->second.type = type;
   if (collections) it->second.collections = std::move(collections);
   if (builders) it->second.builders = std::move(builders);
+  if (it->second.builders) buildersByClass_[identityOf(type)] = it->second.builders;
 }
 
 void MetaRegistry::unregisterType(const Type& type) {
   std::unique_lock lock(mutex_);
   auto it = types_.find(type.getQualifiedName());
-  if (it != types_.end() && it->second.type == type) types_.erase(it);
+  if (it != types_.end() && it->second.type == type) {
+    buildersByClass_.erase(identityOf(type));
+    types_.erase(it);
+  }
 }
 
 MetaRegistry::BuilderFactory MetaRegistry::getBuilderFactory(const Class& metaClass) const {
   std::shared_lock lock(mutex_);
-  auto it = types_.find(metaClass.getQualifiedName());
-  return it == types_.end() || it->second.type != metaClass ? BuilderFactory() : it->second.builders;
+  auto it = buildersByClass_.find(identityOf(metaClass));
+  return it == buildersByClass_.end() ? BuilderFactory() : it->second;
 }
 
 void MetaRegistry::registerTypesOf(const Package& package) {

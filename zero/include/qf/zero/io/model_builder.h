@@ -5,6 +5,7 @@
 // elements that exist already, or refuse to create some.
 #pragma once
 
+#include "qf/zero/core/meta/framework_package.h"
 #include "qf/zero/core/meta/structured_type.h"
 #include "qf/zero/core/model.h"
 #include "qf/zero/core/model_element.h"
@@ -29,6 +30,11 @@ class ModelBuilder {
 
   // Stores a single-valued property; storing the current value changes nothing.
   virtual void setValue(ModelElement& element, const meta::Property& property, const Value& value);
+  // Stores a single-valued JsonValue property from the parsed document's own value, as
+  // setValue does with a Value of `json`; an element that keeps the property as text
+  // takes it without the Value's copy of the tree. A builder that overrides setValue to
+  // store values differently overrides this too.
+  virtual void setJsonValue(ModelElement& element, const meta::Property& property, const JsonValue& json);
   // Adds one item to a many-valued property.
   virtual void setObjectValue(ModelElement& element, const meta::Property& property, const Value& item);
   // Empties a many-valued property before the parse refills it.

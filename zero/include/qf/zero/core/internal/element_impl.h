@@ -143,6 +143,11 @@ class ModelElement::Impl : public RefCounted {
   // writer of text copies it instead of parsing and writing it again. Null for any other
   // property (the default).
   virtual const JsonText* basicGetHeldText(const meta::Property& property) const;
+  // Stores a property that basicGetHeldText answers from its compact text, as
+  // assignValue(property, value of that text, initializing) would: checked, recorded and
+  // notified, but neither parsed nor copied into a Value. `text` must be the compact text
+  // of a JSON value. False, storing nothing, for any other property (the default).
+  virtual bool assignHeldText(const meta::Property& property, JsonText text, bool initializing);
   // mapKeyFromValue(basicGetValue(property)), the key this element has in a map keyed by
   // `property`; typed classes read it from their member without making a Value.
   virtual MapKey basicGetMapKey(const meta::Property& property) const;

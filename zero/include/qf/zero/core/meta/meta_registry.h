@@ -15,6 +15,7 @@
 #include <shared_mutex>
 #include <string>
 #include <string_view>
+#include <unordered_map>
 
 namespace qf::zero::meta {
 
@@ -57,6 +58,10 @@ class MetaRegistry {
 
   mutable std::shared_mutex mutex_;
   std::map<std::u16string, Entry, std::less<>> types_;
+  // The builder factories of the registered classes that have one, by the class itself:
+  // every element made goes through here, and a class's qualified name is built anew on
+  // each call. A key is only ever a type that types_ holds, which keeps it alive.
+  std::unordered_map<const void*, BuilderFactory> buildersByClass_;
   std::map<std::u16string, Package, std::less<>> roots_;
 };
 
