@@ -11,6 +11,7 @@
 #include <cstring>
 #include <iterator>
 #include <string>
+#include <string_view>
 #include <type_traits>
 #include <utility>
 
@@ -34,22 +35,27 @@ bool isPlainAscii(const std::string& text) noexcept {
   constexpr std::uint64_t kOnes = 0x0101010101010101ULL;
   constexpr std::uint64_t kHighs = 0x8080808080808080ULL;
   const auto hasZeroByte = [](std::uint64_t word) { return (word - kOnes) & ~word & kHighs; };
-  std::size_t at = 0;
-  for (; at + 8 <= text.size(); at += 8) {
-    std::uint64_t word;
-    std::memcpy(&word, text.data() + at, 8);
+  const auto isPlainWord = [&](std::uint64_t word) {
     const std::uint64_t low7 = word & ~kHighs;
     const std::uint64_t belowSpace = ~((low7 | kHighs) - 0x20 * kOnes);
     const std::uint64_t isDelete = low7 + kOnes;
     const std::uint64_t special = word | belowSpace | isDelete | hasZeroByte(word ^ (0x22 * kOnes)) |
                                   hasZeroByte(word ^ (0x5c * kOnes));
-    if ((special & kHighs) != 0) return false;
+    return (special & kHighs) == 0;
+  };
+  const std::size_t size = text.size();
+  std::uint64_t word = 0x6161616161616161ULL;  // a short text is padded with 'a's
+  if (size < 8) {
+    std::memcpy(&word, text.data(), size);
+    return isPlainWord(word);
   }
-  for (; at < text.size(); ++at) {
-    const auto byte = static_cast<unsigned char>(text[at]);
-    if (byte < 0x20 || byte >= 0x7f || byte == '"' || byte == '\\') return false;
+  for (std::size_t at = 0; at + 8 <= size; at += 8) {
+    std::memcpy(&word, text.data() + at, 8);
+    if (!isPlainWord(word)) return false;
   }
-  return true;
+  // The last eight bytes, which may overlap the last word read.
+  std::memcpy(&word, text.data() + size - 8, 8);
+  return isPlainWord(word);
 }
 
 void appendString(std::string& out, const std::string& text) {
@@ -173,13 +179,83 @@ std::size_t compactLength(const Json& value) {
   }
 }
 
+char* writePlainString(char* out, const std::string& text) {
+  if (!isPlainAscii(text)) return nullptr;
+  *out++ = '"';
+  std::memcpy(out, text.data(), text.size());
+  out += text.size();
+  *out++ = '"';
+  return out;
+}
+
+template <class Integer>
+char* writeInteger(char* out, Integer value) {
+  return std::to_chars(out, out + decimalLength(value), value).ptr;
+}
+
+// Writes the compact text of `value` from `out` on, into the room compactLength measured,
+// and returns where it ends; null, having written some of it, when a string needs escapes
+// or a float is met, which appendCompact writes instead.
+char* writePlain(char* out, const Json& value) {
+  switch (value.type()) {
+    case Json::value_t::object: {
+      *out++ = '{';
+      bool first = true;
+      for (const auto& [key, member] : value.get_ref<const Json::object_t&>()) {
+        if (!first) *out++ = ',';
+        first = false;
+        if ((out = writePlainString(out, key)) == nullptr) return nullptr;
+        *out++ = ':';
+        if ((out = writePlain(out, member)) == nullptr) return nullptr;
+      }
+      *out++ = '}';
+      return out;
+    }
+    case Json::value_t::array: {
+      *out++ = '[';
+      bool first = true;
+      for (const Json& item : value.get_ref<const Json::array_t&>()) {
+        if (!first) *out++ = ',';
+        first = false;
+        if ((out = writePlain(out, item)) == nullptr) return nullptr;
+      }
+      *out++ = ']';
+      return out;
+    }
+    case Json::value_t::string:
+      return writePlainString(out, value.get_ref<const std::string&>());
+    case Json::value_t::boolean: {
+      const std::string_view word = value.get<bool>() ? "true" : "false";
+      std::memcpy(out, word.data(), word.size());
+      return out + word.size();
+    }
+    case Json::value_t::number_integer:
+      return writeInteger(out, value.get<Json::number_integer_t>());
+    case Json::value_t::number_unsigned:
+      return writeInteger(out, value.get<Json::number_unsigned_t>());
+    case Json::value_t::null:
+      std::memcpy(out, "null", 4);
+      return out + 4;
+    default:
+      return nullptr;
+  }
+}
+
 }  // namespace
 
 JsonText::JsonText() : text_("null") {}
 
 JsonText::JsonText(const nlohmann::ordered_json& value) {
+  // Most values are written straight into the room measured for them; the rest by
+  // appending, which escapes strings and writes floats as the dump does.
+  const std::size_t length = compactLength(value);
+  text_.resize(length);
+  if (const char* end = writePlain(text_.data(), value)) {
+    text_.resize(static_cast<std::size_t>(end - text_.data()));
+    return;
+  }
+  text_.clear();
   try {
-    text_.reserve(compactLength(value));
     appendCompact(text_, value);
   } catch (const nlohmann::json::exception&) {
     reportException(qf0::messages::InvalidValue());
