@@ -82,21 +82,29 @@ TEST(Uuids, FreshOnesAreVersionFourAndDistinctNameBasedOnesAreStable) {
   EXPECT_FALSE(parseUuid(""));
 }
 
-// On seeded random UUIDs: the text of a UUID parses back to it in either case, and any
-// one character replaced by a character out of place (a dash for a digit, a digit for a
-// dash, a letter beyond f) is refused.
+// On seeded random UUIDs: the text of a UUID parses back to it in either case, as UTF-8
+// and as UTF-16, and any one character replaced by a character out of place (a dash for a
+// digit, a digit for a dash, a letter beyond f, a UTF-16 unit whose low byte is a digit) is
+// refused.
 TEST(Uuids, ParseTakesExactlyTheCanonicalForm) {
   std::mt19937 random(7);
   for (int i = 0; i < 500; ++i) {
     const Uuid id = generateNewUuid();
     std::string text = toText(id);
     ASSERT_EQ(parseUuid(text), id) << text;
+    ASSERT_EQ(parseUuid(toUtf16(text)), id) << text;
+    ASSERT_EQ(parseUuid(toUtf16("{" + text + "}")), id) << text;
     std::string upper = text;
     for (char& c : upper) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
     ASSERT_EQ(parseUuid(upper), id) << upper;
     const auto at = std::uniform_int_distribution<std::size_t>(0, text.size() - 1)(random);
+    std::u16string wide = toUtf16(text);
+    wide[at] = static_cast<char16_t>(0x0100 | static_cast<unsigned char>(text[at]));
+    EXPECT_FALSE(parseUuid(wide)) << text << " with a wide unit at " << at;
+    EXPECT_FALSE(parseUuid(toUtf16(text) + u"0")) << "too long";
     text[at] = text[at] == '-' ? 'a' : (i % 2 == 0 ? '-' : 'g');
     EXPECT_FALSE(parseUuid(text)) << text;
+    EXPECT_FALSE(parseUuid(toUtf16(text))) << text;
     EXPECT_FALSE(parseUuid(text.substr(1))) << "too short";
   }
 }

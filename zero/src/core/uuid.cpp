@@ -81,6 +81,17 @@ std::optional<Uuid> parseUuid(std::string_view text) {
   return id;
 }
 
+std::optional<Uuid> parseUuid(std::u16string_view text) {
+  // Only ASCII can be a UUID; anything longer than the braced form is not one.
+  char narrow[38];
+  if (text.size() > sizeof narrow) return std::nullopt;
+  for (std::size_t i = 0; i < text.size(); ++i) {
+    if (text[i] > 0x7f) return std::nullopt;
+    narrow[i] = static_cast<char>(text[i]);
+  }
+  return parseUuid(std::string_view(narrow, text.size()));
+}
+
 Uuid nameBasedUuid(const Uuid& nameSpace, std::string_view name) {
   boost::uuids::name_generator_md5 generator(nameSpace);
   return generator(name.data(), name.size());

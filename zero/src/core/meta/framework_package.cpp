@@ -29,6 +29,11 @@ class TypedTraits final : public ValueTraits {
   std::optional<Value> parseText(std::u16string_view text) const override {
     if constexpr (std::is_same_v<T, std::u16string>) {
       return Value::of(std::u16string(text));
+    } else if constexpr (std::is_same_v<T, Uuid>) {
+      // Every reference and stored element id of a document is read here.
+      std::optional<Uuid> parsed = parseUuid(text);
+      if (!parsed) return std::nullopt;
+      return Value::of(*parsed);
     } else {
       if (!parse_) return std::nullopt;
       std::optional<T> parsed = parse_(toUtf8(text));

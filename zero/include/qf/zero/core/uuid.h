@@ -24,6 +24,8 @@ std::u16string toText16(const Uuid& id);
 
 // Parses the canonical form (braces and upper case accepted); empty when malformed.
 std::optional<Uuid> parseUuid(std::string_view text);
+// The same for text held as UTF-16, without converting it first.
+std::optional<Uuid> parseUuid(std::u16string_view text);
 
 // Name-based (version 3, MD5) UUID of a name in a namespace: the same inputs give
 // the same UUID in every run, which is what fixed metamodel identities need.
