@@ -126,10 +126,14 @@ Delta Commit::Impl::getSnapshot() const {
   qf::zero::Transaction transaction = history::beginTransactionOn(*this);
   const history::ComposedState state = history::snapshotState(self(this));
   const Delta snapshot = Delta::create(getModel());
-  auto& current = snapshot->getCurrentMutable();
-  for (const auto& [uuid, storage] : history::inUuidOrder(state.current)) current.add(*storage);
-  auto& previous = snapshot->getPreviousMutable();
-  for (const auto& [uuid, storage] : history::inUuidOrder(state.previous)) previous.add(*storage);
+  const auto inUuidOrder = [](const history::StateEntries& entries) {
+    std::vector<qf::zero::ModelElement> ordered;
+    ordered.reserve(entries.size());
+    for (const auto& [uuid, storage] : history::inUuidOrder(entries)) ordered.push_back(*storage);
+    return ordered;
+  };
+  snapshot->getCurrentMutable().addAll(inUuidOrder(state.current));
+  snapshot->getPreviousMutable().addAll(inUuidOrder(state.previous));
   snapshot->setIsSnapshot(true);
   transaction.commit();
   return snapshot;

@@ -185,12 +185,21 @@ std::pair<std::uint64_t, std::uint64_t> orderKey(const Uuid& uuid) noexcept {
 }  // namespace
 
 std::vector<std::pair<Uuid, const ObjectStorage*>> inUuidOrder(const StateEntries& entries) {
+  // Sorted by keys worked out once per entry, not once per comparison.
+  struct Keyed {
+    std::pair<std::uint64_t, std::uint64_t> key;
+    const Uuid* uuid;
+    const ObjectStorage* storage;
+  };
+  std::vector<Keyed> keyed;
+  keyed.reserve(entries.size());
+  entries.forEach([&](const Uuid& uuid, const ObjectStorage& storage) {
+    keyed.push_back({orderKey(uuid), &uuid, &storage});
+  });
+  std::sort(keyed.begin(), keyed.end(), [](const Keyed& a, const Keyed& b) { return a.key < b.key; });
   std::vector<std::pair<Uuid, const ObjectStorage*>> ordered;
-  ordered.reserve(entries.size());
-  entries.forEach(
-      [&](const Uuid& uuid, const ObjectStorage& storage) { ordered.emplace_back(uuid, &storage); });
-  std::sort(ordered.begin(), ordered.end(),
-            [](const auto& a, const auto& b) { return orderKey(a.first) < orderKey(b.first); });
+  ordered.reserve(keyed.size());
+  for (const Keyed& entry : keyed) ordered.emplace_back(*entry.uuid, entry.storage);
   return ordered;
 }
 

@@ -18,20 +18,22 @@ using qf::zero::Uuid;
 
 // The three result deltas, filled through their maps inside the comparison's one
 // transaction: the same entries as the delta operations would add, without a savepoint
-// per entry.
+// per entry. The merged delta's entries, which name every element of the base, are
+// gathered in the order they are settled and added at the end in one step per map.
 class Diff3Result {
  public:
-  explicit Diff3Result(const qf::zero::Model& model)
+  explicit Diff3Result(const qf::zero::Model& model, std::size_t expected)
       : merged_(Delta::create(model)), ours_(Delta::create(model)), theirs_(Delta::create(model)) {
     merged_->setIsSnapshot(true);
+    mergedCurrent_.reserve(expected);
   }
 
-  void created(const ObjectStorage& current) { merged_->getCurrentMutable().add(current); }
+  void created(const ObjectStorage& current) { mergedCurrent_.push_back(current); }
   void updated(const ObjectStorage& previous, const ObjectStorage& current) {
-    merged_->getPreviousMutable().add(previous);
-    merged_->getCurrentMutable().add(current);
+    mergedPrevious_.push_back(previous);
+    mergedCurrent_.push_back(current);
   }
-  void deleted(const ObjectStorage& previous) { merged_->getPreviousMutable().add(previous); }
+  void deleted(const ObjectStorage& previous) { mergedPrevious_.push_back(previous); }
 
   // A conflict: each side's version goes to its own delta; an empty handle stands for
   // "deleted" (with a base) or "absent" (without one).
@@ -40,7 +42,11 @@ class Diff3Result {
     record(*theirs_.getImpl(), base, theirs);
   }
 
-  std::vector<Delta> deltas() const { return {merged_, ours_, theirs_}; }
+  std::vector<Delta> finish() {
+    merged_->getPreviousMutable().addAll(mergedPrevious_);
+    merged_->getCurrentMutable().addAll(mergedCurrent_);
+    return {merged_, ours_, theirs_};
+  }
 
  private:
   static void record(Delta::Impl& side, const ObjectStorage& base, const ObjectStorage& version) {
@@ -49,6 +55,7 @@ class Diff3Result {
   }
 
   Delta merged_, ours_, theirs_;
+  std::vector<qf::zero::ModelElement> mergedPrevious_, mergedCurrent_;
 };
 
 // Step one: every element of the base, by what each side did to it. Each element is
@@ -113,14 +120,15 @@ std::vector<Delta> Merge3Strategy::diff3(const Commit& base, const Commit& ours,
   history::requireLive(ours, u"kiv.Merge3Strategy.diff3");
   history::requireLive(theirs, u"kiv.Merge3Strategy.diff3");
   qf::zero::Transaction transaction = history::beginTransactionOn(*ours.getImpl());
-  Diff3Result result(ours.getModel());
   const ComposedState baseState = history::snapshotState(base);
   const ComposedState oursState = history::snapshotState(ours);
   const ComposedState theirsState = history::snapshotState(theirs);
+  Diff3Result result(ours.getModel(), baseState.current.size());
   compareBaseElements(baseState, oursState, theirsState, result);
   compareNewElements(baseState, oursState, theirsState, result);
+  std::vector<Delta> deltas = result.finish();
   transaction.commit();
-  return result.deltas();
+  return deltas;
 }
 
 }  // namespace kiv

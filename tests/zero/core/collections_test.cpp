@@ -5,6 +5,11 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <random>
+#include <string>
+#include <vector>
+
 namespace qf::zero {
 namespace {
 
@@ -88,6 +93,110 @@ TEST_F(Collections, SettingAManyValuedPropertyReplacesItsContentsAtomically) {
   EXPECT_FALSE(a.hasPropertyValue(tm.friends));
   EXPECT_FALSE(tm.refs(c, tm.friends)->contains(a));
 }
+
+// addAll is add() of each element in turn, in one step. On seeded random batches for a map
+// (names rising past the last key or not, repeated names, elements held already, destroyed
+// elements, null handles, elements of another class) and for a sequence, it leaves what
+// adding the same elements one by one in a transaction leaves, raises the same message when
+// that raises, then adds nothing, and a cancelled transaction takes all of it back.
+class AddAll : public Collections, public ::testing::WithParamInterface<unsigned> {
+ protected:
+  static bool isHeldBy(const ModelElement& element, const ModelElement& holder, const meta::Property& via) {
+    const auto& incoming = element->incomingReferences();
+    return std::any_of(incoming.begin(), incoming.end(),
+                       [&](const ModelElement::Impl::IncomingReference& entry) {
+                         return entry.source == holder.getImpl() && entry.property == via.getImpl();
+                       });
+  }
+  // The contents of a collection in an order that does not depend on how a set hashes.
+  std::vector<ModelElement> contents(const ModelElement& owner, const meta::Property& property) {
+    std::vector<ModelElement> items = tm.refs(owner, property)->getAllValuesAndProxies();
+    if (!property->isMap()) {
+      std::sort(items.begin(), items.end(),
+                [](const ModelElement& a, const ModelElement& b) { return a.getUuid() < b.getUuid(); });
+    }
+    return items;
+  }
+};
+
+TEST_P(AddAll, IsAddingEachInTurnInOneStep) {
+  std::mt19937 random(GetParam());
+  const auto pick = [&](int n) { return std::uniform_int_distribution<int>(0, n - 1)(random); };
+  const auto named = [&](int number) {
+    ModelElement node = make();
+    tm.setName(node, u"n" + std::u16string(1, static_cast<char16_t>(u'a' + number / 26)) +
+                         std::u16string(1, static_cast<char16_t>(u'a' + number % 26)));
+    return node;
+  };
+  std::vector<ModelElement> pool;
+  for (int i = 0; i < 60; ++i) pool.push_back(named(i));
+  ModelElement dead = named(70), leaf = tm.leaf.instantiate(model);
+  dead.destroy();
+  const ModelElement one = make(), other = make();
+  for (const meta::Property& property : {tm.index, tm.friends}) {
+    for (int round = 0; round < 25; ++round) {
+      std::vector<ModelElement> batch;
+      int next = pick(20);
+      for (int i = pick(8); i > 0; --i) {
+        switch (pick(14)) {
+          case 0:
+            batch.push_back(ModelElement());
+            break;
+          case 1:
+            batch.push_back(dead);
+            break;
+          case 2:
+            batch.push_back(leaf);
+            break;
+          case 3:
+            batch.push_back(pool[pick(60)]);
+            break;
+          case 4:
+            batch.push_back(named(pick(60)));
+            break;  // a name that may be taken
+          default:
+            next += 1 + pick(3);
+            batch.push_back(pool[next % 60]);
+            break;
+        }
+      }
+      std::string expectedError, actualError;
+      {
+        Transaction transaction = model->beginTransaction();
+        try {
+          for (const ModelElement& element : batch) tm.refs(one, property)->add(element);
+          transaction.commit();
+        } catch (const foundation::core::except::ExceptionBase& error) {
+          expectedError = error.GetID();
+        }
+      }
+      const std::vector<ModelElement> before = contents(other, property);
+      try {
+        tm.refs(other, property)->addAll(batch);
+      } catch (const foundation::core::except::ExceptionBase& error) {
+        actualError = error.GetID();
+      }
+      ASSERT_EQ(actualError, expectedError) << "round " << round;
+      if (!actualError.empty()) {
+        EXPECT_EQ(contents(other, property), before) << "a refused batch adds none";
+      }
+      ASSERT_EQ(contents(other, property), contents(one, property)) << "round " << round;
+      for (const ModelElement& element : tm.refs(other, property)->getAllValuesAndProxies()) {
+        EXPECT_TRUE(isHeldBy(element, other, property)) << "the incoming index knows the holder";
+      }
+    }
+    const std::vector<ModelElement> before = contents(other, property);
+    std::vector<ModelElement> fresh;
+    {
+      Transaction cancelled = model->beginTransaction();
+      for (int i = 0; i < 5; ++i) fresh.push_back(named(80 + i));
+      tm.refs(other, property)->addAll(fresh);
+    }
+    EXPECT_EQ(contents(other, property), before) << "a cancel takes a batch back";
+  }
+}
+
+INSTANTIATE_TEST_SUITE_P(Seeds, AddAll, ::testing::Range(1U, 9U));
 
 }  // namespace
 }  // namespace qf::zero

@@ -52,6 +52,36 @@ void ReferenceCollection::insert(std::size_t position, const ModelElement& eleme
   operation.commit();
 }
 
+void ReferenceCollection::addAll(const std::vector<ModelElement>& elements) {
+  Operation operation(*this);
+  // Containment and opposite ends need the whole of insert for each element.
+  if (!property_->isMap() || isComposite() || property_->getOpposite()) {
+    for (const ModelElement& element : elements) insert(npos, element);
+    operation.commit();
+    return;
+  }
+  for (const ModelElement& element : elements) {
+    if (!element) reportException(qf0::messages::CannotAddNonExistentObject());
+    owner_->checkReferenceAssignable(property_, element);
+    MapKey key = keyOf(element);
+    if (ModelElement holder = basicFindByKey(key); holder) {
+      if (holder == element) reportException(qf0::messages::CannotAddSecondObject());
+      reportException(qf0::messages::UniquenessConstraint());
+    }
+    std::vector<CollectionEdit>* log = modifying();
+    const std::size_t at = size();
+    if (!basicInsertUnderKey(element, key)) continue;
+    element->basicLinkIncoming(owner_, property_);
+    if (log != nullptr)
+      log->push_back({CollectionEdit::Kind::Inserted, at, Value::of(element), std::move(key)});
+  }
+  operation.commit();
+}
+
+bool ReferenceCollection::basicInsertUnderKey(const ModelElement& element, const MapKey&) {
+  return basicInsert(npos, element);
+}
+
 bool ReferenceCollection::remove(const ModelElement& element) {
   if (!element || !basicContains(element.getImpl())) return false;
   Operation operation(*this);

@@ -34,6 +34,10 @@ class ReferenceCollection : public AbstractOwnedCollection,
   // unique collection holds the element already, "UniquenessConstraint" when a map
   // holds another element under its key.
   void add(const ModelElement& element) { insert(npos, element); }
+  // add() of each element in turn, in one step: raises what add() would for the first
+  // element refused, and then adds none. A map without containment or opposite end takes
+  // each element with one look-up of its key, none when the keys rise past the last one.
+  void addAll(const std::vector<ModelElement>& elements);
   void insert(std::size_t position, const ModelElement& element);
   // False when the element is not there.
   bool remove(const ModelElement& element);
@@ -105,6 +109,8 @@ class ReferenceCollection : public AbstractOwnedCollection,
 
  protected:
   virtual bool basicInsert(std::size_t position, const ModelElement& element) = 0;
+  // basicInsert at the end, for a map: `key` is keyOf(element), computed already.
+  virtual bool basicInsertUnderKey(const ModelElement& element, const MapKey& key);
   virtual bool basicErase(const ModelElement::Impl* element) = 0;
   // REQUIRES: isPositional(), position < size().
   virtual void basicEraseAt(std::size_t position) = 0;
@@ -308,6 +314,9 @@ class TypedReferenceCollection : public ReferenceCollection {
     T typed = elementCast<T>(element);
     const MapKey key = getCollectionProperty()->isMap() ? keyOf(element) : MapKey();
     return store_.insert(position, typed, key);
+  }
+  bool basicInsertUnderKey(const ModelElement& element, const MapKey& key) override {
+    return store_.insert(npos, elementCast<T>(element), key);
   }
   bool basicErase(const ModelElement::Impl* element) override {
     if constexpr (kKeyed) {
