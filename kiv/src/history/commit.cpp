@@ -126,14 +126,14 @@ Delta Commit::Impl::getSnapshot() const {
   qf::zero::Transaction transaction = history::beginTransactionOn(*this);
   const history::ComposedState state = history::snapshotState(self(this));
   const Delta snapshot = Delta::create(getModel());
-  const auto inUuidOrder = [](const history::StateEntries& entries) {
+  const auto elementsInUuidOrder = [](const history::StateEntries& entries) {
     std::vector<qf::zero::ModelElement> ordered;
     ordered.reserve(entries.size());
     for (const auto& [uuid, storage] : history::inUuidOrder(entries)) ordered.push_back(*storage);
     return ordered;
   };
-  snapshot->getCurrentMutable().addAll(inUuidOrder(state.current));
-  snapshot->getPreviousMutable().addAll(inUuidOrder(state.previous));
+  snapshot->getCurrentMutable().addAll(elementsInUuidOrder(state.current));
+  snapshot->getPreviousMutable().addAll(elementsInUuidOrder(state.previous));
   snapshot->setIsSnapshot(true);
   transaction.commit();
   return snapshot;
